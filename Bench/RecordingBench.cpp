@@ -73,7 +73,10 @@ void BM_ContainerWrite_FullRecording_8799Frames(benchmark::State& state) {
     state.SetBytesProcessed(static_cast<int64_t>(state.iterations() * bytes));
     state.counters["frames"] = static_cast<double>(recording.frames().size());
 }
-BENCHMARK(BM_ContainerWrite_FullRecording_8799Frames)->Unit(benchmark::kMillisecond)->Repetitions(5)->ReportAggregatesOnly(true);
+BENCHMARK(BM_ContainerWrite_FullRecording_8799Frames)
+    ->Unit(benchmark::kMillisecond)
+    ->Repetitions(5)
+    ->ReportAggregatesOnly(true);
 
 void BM_ContainerRead_FullRecording_8799Frames(benchmark::State& state) {
     PipelineRecording source = fullRecording();
@@ -84,7 +87,10 @@ void BM_ContainerRead_FullRecording_8799Frames(benchmark::State& state) {
     }
     state.SetBytesProcessed(static_cast<int64_t>(state.iterations() * data.bytes().size()));
 }
-BENCHMARK(BM_ContainerRead_FullRecording_8799Frames)->Unit(benchmark::kMillisecond)->Repetitions(5)->ReportAggregatesOnly(true);
+BENCHMARK(BM_ContainerRead_FullRecording_8799Frames)
+    ->Unit(benchmark::kMillisecond)
+    ->Repetitions(5)
+    ->ReportAggregatesOnly(true);
 
 // The JSON parse alone, to tell the reader's own share from the parser's.
 void BM_ContainerParseOnly_FullRecording_8799Frames(benchmark::State& state) {
@@ -93,7 +99,10 @@ void BM_ContainerParseOnly_FullRecording_8799Frames(benchmark::State& state) {
     for (auto _ : state) benchmark::DoNotOptimize(PropertyValue::fromJSON(data));
     state.SetBytesProcessed(static_cast<int64_t>(state.iterations() * data.bytes().size()));
 }
-BENCHMARK(BM_ContainerParseOnly_FullRecording_8799Frames)->Unit(benchmark::kMillisecond)->Repetitions(5)->ReportAggregatesOnly(true);
+BENCHMARK(BM_ContainerParseOnly_FullRecording_8799Frames)
+    ->Unit(benchmark::kMillisecond)
+    ->Repetitions(5)
+    ->ReportAggregatesOnly(true);
 
 // The hex text of a full recording's reports (4350 reports of 73 bytes); bytes/s count text.
 std::vector<uint8_t> fullRecordingReportBytes() {
@@ -115,7 +124,10 @@ void BM_HexEncode_FullRecordingReports(benchmark::State& state) {
     }
     state.SetBytesProcessed(static_cast<int64_t>(state.iterations() * text.size()));
 }
-BENCHMARK(BM_HexEncode_FullRecordingReports)->Unit(benchmark::kMicrosecond)->Repetitions(5)->ReportAggregatesOnly(true);
+BENCHMARK(BM_HexEncode_FullRecordingReports)
+    ->Unit(benchmark::kMicrosecond)
+    ->Repetitions(5)
+    ->ReportAggregatesOnly(true);
 
 void BM_HexDecode_FullRecordingReports(benchmark::State& state) {
     std::string text;
@@ -128,7 +140,10 @@ void BM_HexDecode_FullRecordingReports(benchmark::State& state) {
     }
     state.SetBytesProcessed(static_cast<int64_t>(state.iterations() * text.size()));
 }
-BENCHMARK(BM_HexDecode_FullRecordingReports)->Unit(benchmark::kMicrosecond)->Repetitions(5)->ReportAggregatesOnly(true);
+BENCHMARK(BM_HexDecode_FullRecordingReports)
+    ->Unit(benchmark::kMicrosecond)
+    ->Repetitions(5)
+    ->ReportAggregatesOnly(true);
 
 }  // namespace
 }  // namespace ZeltoTouch

@@ -243,9 +243,21 @@ bool wouldFormCycle(const PropertyValue& container, const PropertyValue& inserte
 }  // namespace
 
 Entries Record::normalized(Entries entries) {
-    auto byKey = [](const Entry& a, const Entry& b) { return a.first < b.first; };
+    auto byKey = [](const Entry& a, const Entry& b) { return std::string_view(a.first) < std::string_view(b.first); };
     if (!std::is_sorted(entries.begin(), entries.end(), byKey)) {
-        std::stable_sort(entries.begin(), entries.end(), byKey);
+        // Objects are small: a stable insertion sort needs no buffer, where stable_sort takes one.
+        constexpr size_t kInsertionSortLimit = 16;
+        if (entries.size() <= kInsertionSortLimit) {
+            for (auto it = entries.begin() + 1; it < entries.end(); ++it) {
+                if (!byKey(*it, *(it - 1))) continue;
+                Entry moving = std::move(*it);
+                auto hole = it;
+                for (; hole != entries.begin() && byKey(moving, *(hole - 1)); --hole) *hole = std::move(*(hole - 1));
+                *hole = std::move(moving);
+            }
+        } else {
+            std::stable_sort(entries.begin(), entries.end(), byKey);
+        }
     }
     // Keep the last of each run of equal keys, and only entries that hold a value.
     size_t kept = 0;

@@ -1,12 +1,9 @@
-// JSON text form of PropertyValue: RapidJSON's SAX reader builds the tree directly, and its
-// writer serialises straight from the tree; no intermediate DOM.
+// JSON text form of PropertyValue, writing: RapidJSON's writer serialises straight from the
+// tree, with no intermediate DOM. Reading is in PropertyValueJSONReading.cpp.
 
 #include <charconv>
 #include <cmath>
 #include <limits>
-
-#include <rapidjson/memorystream.h>
-#include <rapidjson/reader.h>
 
 #include "Host/JSONWriter.h"
 #include "Host/PropertyValueRecord.h"
@@ -17,67 +14,6 @@ namespace ZeltoTouch {
 using Record = PropertyValue::Record;
 
 namespace {
-
-// SAX handler that builds the tree bottom-up: finished values wait on one stack (keys on
-// another) until their container ends, and each container takes its children in one move.
-class TreeBuilder : public rapidjson::BaseReaderHandler<rapidjson::UTF8<>, TreeBuilder> {
-public:
-    bool Null() { return push(PropertyValue::null()); }
-    bool Bool(bool b) { return push(PropertyValue::fromBool(b)); }
-    bool Int(int i) { return push(i < 0 ? PropertyValue::fromInt32(i) : PropertyValue::fromUInt64(static_cast<uint64_t>(i))); }
-    bool Uint(unsigned u) { return push(PropertyValue::fromUInt64(u)); }
-    bool Int64(int64_t i) { return push(i < 0 ? PropertyValue::fromInt64(i) : PropertyValue::fromUInt64(static_cast<uint64_t>(i))); }
-    bool Uint64(uint64_t u) { return push(PropertyValue::fromUInt64(u)); }
-    bool Double(double d) { return push(PropertyValue::fromDouble(d)); }
-    // Encoding is checked here rather than by the reader: one pass over the finished string
-    // is several times faster than the reader's per-character validation.
-    bool String(const char* text, rapidjson::SizeType length, bool) {
-        std::string_view view(text, length);
-        return isValidUTF8(view) && push(Record::make<std::string>(false, view));
-    }
-    bool Key(const char* text, rapidjson::SizeType length, bool) {
-        std::string_view view(text, length);
-        if (!isValidUTF8(view)) return false;
-        _keys.emplace_back(view);
-        return true;
-    }
-    bool StartObject() { return open(); }
-    bool StartArray() { return open(); }
-    bool EndArray(rapidjson::SizeType count) {
-        std::vector<PropertyValue> elements(std::make_move_iterator(_values.end() - count),
-                                            std::make_move_iterator(_values.end()));
-        _values.resize(_values.size() - count);
-        return close(Record::make<std::vector<PropertyValue>>(false, std::move(elements)));
-    }
-    bool EndObject(rapidjson::SizeType count) {
-        Record::Entries entries;
-        entries.reserve(count);
-        size_t firstKey = _keys.size() - count, firstValue = _values.size() - count;
-        for (size_t i = 0; i < count; ++i) {
-            entries.emplace_back(std::move(_keys[firstKey + i]), std::move(_values[firstValue + i]));
-        }
-        _keys.resize(firstKey);
-        _values.resize(firstValue);
-        return close(Record::make<Record::Entries>(false, Record::normalized(std::move(entries))));
-    }
-
-    PropertyValue result() { return _values.size() == 1 ? std::move(_values.front()) : PropertyValue(); }
-
-private:
-    bool push(PropertyValue value) {
-        _values.push_back(std::move(value));
-        return true;
-    }
-    bool open() { return ++_depth <= PropertyValue::kMaxJSONDepth; }
-    bool close(PropertyValue container) {
-        --_depth;
-        return push(std::move(container));
-    }
-
-    std::vector<PropertyValue> _values;
-    std::vector<std::string> _keys;
-    size_t _depth = 0;
-};
 
 // Shortest text that reads back as the same float, marked as floating so it does not come
 // back as an integer.
@@ -147,24 +83,6 @@ bool writeValue(rapidjson::Writer<rapidjson::StringBuffer>& writer, const Proper
 
 bool writeJSON(rapidjson::Writer<rapidjson::StringBuffer>& writer, const PropertyValue& value, size_t enclosingDepth) {
     return writeValue(writer, value, enclosingDepth);
-}
-
-PropertyValue PropertyValue::fromJSON(std::string_view text) {
-    constexpr unsigned kFlags = rapidjson::kParseFullPrecisionFlag | rapidjson::kParseIterativeFlag;
-    rapidjson::MemoryStream stream(text.data(), text.size());
-    TreeBuilder builder;
-    rapidjson::Reader reader;
-    if (reader.Parse<kFlags>(stream, builder).IsError()) return {};
-    // The stream ends at a NUL byte; one inside the text must not end the document early.
-    if (stream.Tell() != text.size()) return {};
-    return builder.result();
-}
-
-PropertyValue PropertyValue::fromJSON(const PropertyValue& data) {
-    if (data.isString()) return fromJSON(data.stringView());
-    auto bytes = data.bytes();
-    if (!data.isData()) return {};
-    return fromJSON(std::string_view(reinterpret_cast<const char*>(bytes.data()), bytes.size()));
 }
 
 bool PropertyValue::toJSON(std::string& out) const {

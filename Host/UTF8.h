@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <cstring>
 #include <string_view>
 
 namespace ZeltoTouch {
@@ -10,6 +11,12 @@ inline bool isValidUTF8(std::string_view text) noexcept {
     const auto* p = reinterpret_cast<const uint8_t*>(text.data());
     const auto* end = p + text.size();
     while (p < end) {
+        // Text is mostly ASCII: skip it eight bytes at a time.
+        uint64_t word;
+        if (end - p >= 8 && (std::memcpy(&word, p, 8), (word & 0x8080808080808080u) == 0)) {
+            p += 8;
+            continue;
+        }
         uint8_t lead = *p;
         if (lead < 0x80) {
             ++p;

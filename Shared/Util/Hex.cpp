@@ -95,7 +95,20 @@ PropertyValue hexStringFromBytes(std::span<const uint8_t> bytes) {
 void appendBytesFromHexText(std::string_view text, std::vector<uint8_t>& out) {
     out.reserve(out.size() + text.size() / 3 + 1);
     size_t pos = 0;
-    while (const std::optional<uint16_t> value = extractHex16(text, pos)) {
+    for (;;) {
+        // The written form first: two digits that end the text or are followed by whitespace
+        // are one byte, exactly as the extraction below would read them, without its steps.
+        if (pos + 2 <= text.size()) {
+            const uint8_t high = digitValue(text[pos]), low = digitValue(text[pos + 1]);
+            const size_t next = pos + 2;
+            if ((high | low) < 16 && (next == text.size() || isStreamSpace(text[next]))) {
+                out.push_back(static_cast<uint8_t>(high << 4 | low));
+                pos = next == text.size() ? next : next + 1;
+                continue;
+            }
+        }
+        const std::optional<uint16_t> value = extractHex16(text, pos);
+        if (!value) break;
         if (*value > 0xFF) throw std::invalid_argument("invalid hex string");
         out.push_back(static_cast<uint8_t>(*value));
     }
