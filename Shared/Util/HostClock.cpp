@@ -24,4 +24,6 @@ void setHostClock(const HostClock* clock) noexcept {
 
 const HostClock& hostClock() noexcept { return *gClock.load(std::memory_order_acquire); }
 
+bool isHostClockInstalled() noexcept { return gClock.load(std::memory_order_acquire) != &gStoppedClock; }
+
 }  // namespace ZeltoTouch::Util

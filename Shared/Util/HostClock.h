@@ -24,5 +24,6 @@ public:
 // stands still (timebase 1/1, time 0, no sleeping) answers.
 void setHostClock(const HostClock* clock) noexcept;
 const HostClock& hostClock() noexcept;
+bool isHostClockInstalled() noexcept;
 
 }  // namespace ZeltoTouch::Util
