@@ -51,16 +51,14 @@ void Algs::processTouchFrame(const PixelValues& values, uint32_t frameNumber, ui
     // Each pixel update is split into two passes over the channels (same result as
     // updatePixelState one by one), so the independent divisions of the first overlap.
     const float threshold = _handStats.activationThreshold;
-    for (size_t i = 0; i < _pixels.size(); ++i) _pixels[i].scaleReading(values.at(i), threshold);
+    for (size_t i = 0; i < kPixelCount; ++i) _pixels[i].scaleReading(values[i], threshold);
     for (Pixel& pixel : _pixels) pixel.updateActivity();
     _virtualImage.updateValues(_pixels);
-    for (size_t i = 0; i < _virtualPixels.size(); ++i) {
+    for (size_t i = 0; i < kVirtualPixelCount; ++i) {
         // The virtual pixel sees the sum's low 16 bits as a signed number.
-        _virtualPixels[i].scaleReading(static_cast<int16_t>(_virtualImage.values.at(i)), threshold);
+        _virtualPixels[i].scaleReading(static_cast<int16_t>(_virtualImage.values[i]), threshold);
     }
-    for (size_t i = 0; i < _virtualPixels.size(); ++i) {
-        _virtualPixels[i].updateActivity(_virtualImage.maxPixelIndices.at(i));
-    }
+    for (size_t i = 0; i < kVirtualPixelCount; ++i) _virtualPixels[i].updateActivity(_virtualImage.maxPixelIndices[i]);
     _handStats.updateHandState(_pixels, _virtualPixels, timeMs);
 
     const GestureDecision decision = decideGesture(_handStats, _lastEventPhase);

@@ -20,6 +20,7 @@ struct FrameScan {
     bool anyActive = false;
     int32_t strongestIndex = 0;  // pixel A when no channel is above 0
     float strongestValue = 0;
+    int32_t aboveNoiseNeverActive = 0;  // channels above noise in this gesture, never active
 };
 
 }  // namespace
@@ -36,21 +37,25 @@ void HandStats::SetDecayParameters() noexcept { decayBase = 7.389056f; }
 void HandStats::updateHandState(const std::vector<Pixel>& pixels, const std::vector<VirtualPixel>& virtualPixels,
                                 uint32_t timeMs) {
     FrameScan scan;
+    // Kept in locals while scanning: the pixels' floats might alias the members otherwise.
+    float peakValue = peakActiveValue;
+    int32_t peakIndex = peakActiveIndex;
     const auto scanChannel = [&](const Pixel& channel) {
         const float n = channel.normalizedValue < 0 ? 0.0f : channel.normalizedValue;
-        scan.anyAboveNoise = scan.anyAboveNoise || channel.aboveNoise;
-        scan.anyActive = scan.anyActive || channel.active;
-        if (channel.active && n > peakActiveValue) {
-            peakActiveValue = n;
-            peakActiveIndex = channel.index;
-        }
-        if (n > scan.strongestValue) {
-            scan.strongestValue = n;
-            scan.strongestIndex = channel.index;
-        }
+        scan.anyAboveNoise |= channel.aboveNoise;
+        scan.anyActive |= channel.active;
+        scan.aboveNoiseNeverActive += channel.everAboveNoise && !channel.everActive;
+        const bool newPeak = channel.active && n > peakValue;
+        peakValue = newPeak ? n : peakValue;
+        peakIndex = newPeak ? channel.index : peakIndex;
+        const bool strongest = n > scan.strongestValue;
+        scan.strongestValue = strongest ? n : scan.strongestValue;
+        scan.strongestIndex = strongest ? channel.index : scan.strongestIndex;
     };
     for (const Pixel& pixel : pixels) scanChannel(pixel);
     for (const VirtualPixel& pixel : virtualPixels) scanChannel(pixel);
+    peakActiveValue = peakValue;
+    peakActiveIndex = peakIndex;
 
     wasTouching = touching;
     touching = scan.anyActive;
@@ -69,7 +74,7 @@ void HandStats::updateHandState(const std::vector<Pixel>& pixels, const std::vec
     if (wasTouching && !touching) touchEndMs = timeMs;
 
     updateTouchScore(pixels, virtualPixels, timeMs);
-    updateTapRejection(pixels, virtualPixels);
+    updateTapRejection(scan.aboveNoiseNeverActive);
 
     wasHolding = holding;
     wasHoldTimeElapsed = holdTimeElapsed;
@@ -129,6 +134,16 @@ void HandStats::decayTouchScore(uint32_t timeMs) noexcept {
 
 void HandStats::updateTapRejection(const std::vector<Pixel>& pixels,
                                    const std::vector<VirtualPixel>& virtualPixels) noexcept {
+    int32_t aboveNoiseNeverActive = 0;
+    const auto count = [&](const Pixel& channel) {
+        if (channel.everAboveNoise && !channel.everActive) ++aboveNoiseNeverActive;
+    };
+    for (const Pixel& pixel : pixels) count(pixel);
+    for (const VirtualPixel& pixel : virtualPixels) count(pixel);
+    updateTapRejection(aboveNoiseNeverActive);
+}
+
+void HandStats::updateTapRejection(int32_t aboveNoiseNeverActive) noexcept {
     peakAmplitude = peakActiveValue * activationThreshold;
 
     // Above-noise time of this touch, counted from the last gesture if that ended later.
@@ -145,13 +160,6 @@ void HandStats::updateTapRejection(const std::vector<Pixel>& pixels,
         timeDurationRatio = static_cast<float>(touchMs) / static_cast<float>(aboveNoiseMs) - 0.25f;
     }
     if (touchMs != 0) tsd = peakAmplitude / static_cast<float>(touchMs) - 0.65f;
-
-    int32_t aboveNoiseNeverActive = 0;
-    const auto count = [&](const Pixel& channel) {
-        if (channel.everAboveNoise && !channel.everActive) ++aboveNoiseNeverActive;
-    };
-    for (const Pixel& pixel : pixels) count(pixel);
-    for (const VirtualPixel& pixel : virtualPixels) count(pixel);
     nonActivePixels = kNonActivePixelAllowance - aboveNoiseNeverActive;
 
     tapSVMScore = (static_cast<float>(nonActivePixels) * kTapNonActivePixelsWeight) +

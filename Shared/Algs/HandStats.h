@@ -29,6 +29,8 @@ struct HandStats {
                           uint32_t timeMs);
     void decayTouchScore(uint32_t timeMs) noexcept;
     void updateTapRejection(const std::vector<Pixel>& pixels, const std::vector<VirtualPixel>& virtualPixels) noexcept;
+    // The same from the number of channels above noise but never active in this gesture.
+    void updateTapRejection(int32_t aboveNoiseNeverActive) noexcept;
 
     // Region tracking.
     PixelRegion updateActiveRegion(const std::vector<Pixel>& pixels, const std::vector<VirtualPixel>& virtualPixels,

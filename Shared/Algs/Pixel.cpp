@@ -13,20 +13,7 @@ constexpr std::array<float, kPixelCount> kChannelGains = {
     1.5378f, 1.5431f, 1.04f,   1.0493f,                    // L to O
 };
 
-constexpr uint32_t kVolumeUpChannels = 0b000'0011'1100'0000;    // G H I J
-constexpr uint32_t kVolumeDownChannels = 0b111'1000'0000'0000;  // L M N O
-constexpr uint32_t kPlayPauseChannels = 0b000'0100'0011'1111;   // A to F, K
-
 }  // namespace
-
-PixelRegion regionOfChannel(int32_t index) noexcept {
-    if (index < 0 || index >= 32) return PixelRegion::None;
-    const uint32_t bit = 1u << index;
-    if (bit & kVolumeUpChannels) return PixelRegion::VolumeUp;
-    if (bit & kVolumeDownChannels) return PixelRegion::VolumeDown;
-    if (bit & kPlayPauseChannels) return PixelRegion::PlayPause;
-    return PixelRegion::None;
-}
 
 float channelGain(int index) noexcept { return kChannelGains.at(static_cast<size_t>(index)); }
 

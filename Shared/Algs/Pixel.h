@@ -26,7 +26,17 @@ inline constexpr int kRegionCount = 4;                         // including Pixe
 inline constexpr int32_t kNoiseLevel = 75;
 
 // The region of a physical channel index (0 to 14); any other index has no region.
-PixelRegion regionOfChannel(int32_t index) noexcept;
+inline PixelRegion regionOfChannel(int32_t index) noexcept {
+    constexpr uint32_t kVolumeUpChannels = 0b000'0011'1100'0000;    // G H I J
+    constexpr uint32_t kVolumeDownChannels = 0b111'1000'0000'0000;  // L M N O
+    constexpr uint32_t kPlayPauseChannels = 0b000'0100'0011'1111;   // A to F, K
+    if (index < 0 || index >= 32) return PixelRegion::None;
+    const uint32_t bit = 1u << index;
+    if (bit & kVolumeUpChannels) return PixelRegion::VolumeUp;
+    if (bit & kVolumeDownChannels) return PixelRegion::VolumeDown;
+    if (bit & kPlayPauseChannels) return PixelRegion::PlayPause;
+    return PixelRegion::None;
+}
 
 // Gain of physical channel `index` (0 to 14).
 float channelGain(int index) noexcept;
@@ -35,6 +45,7 @@ float channelGain(int index) noexcept;
 // ends and NaN gives 0, so every input has a defined result.
 inline int32_t truncateToInt32(float value) noexcept {
     constexpr float kLimit = 2147483648.0f;  // 2^31, exact; every float below it fits
+    if (std::fabs(value) < kLimit) return static_cast<int32_t>(value);  // every reading
     if (std::isnan(value)) return 0;
     if (value >= kLimit) return std::numeric_limits<int32_t>::max();
     if (value < -kLimit) return std::numeric_limits<int32_t>::min();

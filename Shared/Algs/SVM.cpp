@@ -1,9 +1,6 @@
 #include "Shared/Algs/SVM.h"
 
-#include <algorithm>
-#include <climits>
 #include <array>
-#include <functional>
 #include <stdexcept>
 
 namespace ZeltoTouch {
@@ -36,11 +33,34 @@ constexpr std::array<RankTerm, kChannelCount> kRankTerms = {{
 }  // namespace
 
 SVM::SVM() {
+    for (size_t channel = 0; channel < _rankOrder.size(); ++channel) {
+        _rankOrder[channel] = static_cast<uint8_t>(channel);
+    }
     for (const RankTerm& term : kRankTerms) {
         means.push_back(term.mean);
         scales.push_back(term.scale);
         weights.push_back(term.weight);
     }
+}
+
+std::array<int32_t, kChannelCount> SVM::rankDescending(const std::array<int32_t, kChannelCount>& values) noexcept {
+    // Insertion sort starting from the previous order: a frame ranks its channels much as
+    // the last one did, so fewer of them move than from scratch. Equal values keep their
+    // order; the score cannot tell them apart anyway.
+    std::array<int32_t, kChannelCount> ranked;
+    for (size_t rank = 0; rank < ranked.size(); ++rank) ranked[rank] = values[_rankOrder[rank]];
+    for (size_t rank = 1; rank < ranked.size(); ++rank) {
+        const int32_t value = ranked[rank];
+        const uint8_t channel = _rankOrder[rank];
+        size_t to = rank;
+        for (; to > 0 && ranked[to - 1] < value; --to) {
+            ranked[to] = ranked[to - 1];
+            _rankOrder[to] = _rankOrder[to - 1];
+        }
+        ranked[to] = value;
+        _rankOrder[to] = channel;
+    }
+    return ranked;
 }
 
 void SVM::updateSVMScore(const std::vector<Pixel>& pixels, const std::vector<VirtualPixel>& virtualPixels,
@@ -53,24 +73,22 @@ void SVM::updateSVMScore(const std::vector<Pixel>& pixels, const std::vector<Vir
     if (pixels.size() < kPixelCount || virtualPixels.size() < kVirtualPixelCount) {
         throw std::out_of_range("SVM: a frame has 15 physical and 23 virtual pixels");
     }
-    std::array<int32_t, kChannelCount> ranked;
-    for (size_t i = 0; i < kPixelCount; ++i) ranked[i] = pixels[i].value;
-    for (size_t i = 0; i < kVirtualPixelCount; ++i) ranked[kPixelCount + i] = virtualPixels[i].value;
+    // Most frames are idle: the ranking is paid for only when the leader is above the
+    // threshold or the runner-up above noise, that is when any value is above the
+    // threshold or two are above noise.
+    std::array<int32_t, kChannelCount> values;
+    bool anyAboveThreshold = false;
+    int32_t aboveNoise = 0;
+    const auto take = [&](size_t channel, int32_t value) {
+        values[channel] = value;
+        anyAboveThreshold |= static_cast<float>(value) > activationThreshold;
+        aboveNoise += value > kNoiseLevel;
+    };
+    for (size_t i = 0; i < kPixelCount; ++i) take(i, pixels[i].value);
+    for (size_t i = 0; i < kVirtualPixelCount; ++i) take(kPixelCount + i, virtualPixels[i].value);
+    if (!anyAboveThreshold && aboveNoise < 2) return;
 
-    // Most frames are idle: look at the two leaders before paying for the sort.
-    int32_t first = INT32_MIN;
-    int32_t second = INT32_MIN;
-    for (const int32_t value : ranked) {
-        if (value > first) {
-            second = first;
-            first = value;
-        } else if (value > second) {
-            second = value;
-        }
-    }
-    if (!(static_cast<float>(first) > activationThreshold) && second <= kNoiseLevel) return;
-
-    std::sort(ranked.begin(), ranked.end(), std::greater<>());
+    const std::array<int32_t, kChannelCount> ranked = rankDescending(values);
     // The terms are independent, so they are computed in one pass the compiler can
     // vectorise; the sum then adds them in rank order.
     const float* mean = means.data();

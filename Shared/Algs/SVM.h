@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <vector>
 
@@ -23,6 +24,13 @@ struct SVM {
     std::vector<float> scales;
     std::vector<float> weights;
     float bias = 2.0083f;
+
+private:
+    // The channel values (physical, then virtual) in descending order.
+    std::array<int32_t, kChannelCount> rankDescending(const std::array<int32_t, kChannelCount>& values) noexcept;
+
+    // Channel numbers in the order the last evaluated frame ranked them.
+    std::array<uint8_t, kChannelCount> _rankOrder;
 };
 
 }  // namespace ZeltoTouch

@@ -1,7 +1,7 @@
 #include "Shared/Algs/VirtualImage.h"
 
+#include <algorithm>
 #include <array>
-#include <span>
 #include <stdexcept>
 #include <string_view>
 
@@ -11,18 +11,23 @@ namespace {
 
 constexpr int32_t channelOfLetter(char letter) noexcept { return letter - 'A'; }
 
+// Member slot of a three-member combination's missing fourth member.
+constexpr int32_t kPaddingChannel = kPixelCount;
+
 struct VirtualChannel {
     // The members are the channels of the name's letters, in the name's order.
     constexpr VirtualChannel(std::string_view name, float normalizationFactor)
-        : name(name), normalizationFactor(normalizationFactor), memberCount(name.size()) {
-        for (size_t i = 0; i < memberCount; ++i) memberChannels[i] = channelOfLetter(name[i]);
+        : name(name), normalizationFactor(normalizationFactor) {
+        for (size_t i = 0; i < memberChannels.size(); ++i) {
+            memberChannels[i] = i < name.size() ? channelOfLetter(name[i]) : kPaddingChannel;
+            if (i < name.size()) memberMask |= 1u << memberChannels[i];
+        }
     }
-    std::span<const int32_t> members() const noexcept { return {memberChannels.data(), memberCount}; }
 
     std::string_view name;
     float normalizationFactor;  // roughly one over the member count
     std::array<int32_t, 4> memberChannels{};
-    size_t memberCount;
+    uint32_t memberMask = 0;  // bit per member channel
 };
 
 constexpr std::array<VirtualChannel, kVirtualPixelCount> kVirtualChannels = {{
@@ -51,17 +56,40 @@ void VirtualImage::updateValues(const std::vector<Pixel>& pixels) {
     if (values.size() < names.size() || maxPixelIndices.size() < names.size()) {
         throw std::out_of_range("VirtualImage: tables of different lengths");
     }
+    if (names.size() > kVirtualChannels.size()) {
+        throw std::out_of_range("VirtualImage: more channels than combinations");
+    }
+    // What each channel adds to a sum: its value when above noise, else 0. After them one
+    // slot of 0 pads the three-member combinations to four.
+    std::array<int32_t, kPixelCount + 1> contributions{};
+    uint32_t channelsAboveNoise = 0;
+    for (size_t i = 0; i < kPixelCount; ++i) {
+        const int32_t value = pixels[i].value;
+        const bool aboveNoise = value > kNoiseLevel;
+        contributions[i] = aboveNoise ? value : 0;
+        channelsAboveNoise |= static_cast<uint32_t>(aboveNoise) << i;
+    }
     for (size_t i = 0; i < names.size(); ++i) {
+        const VirtualChannel& channel = kVirtualChannels[i];
+        // Without a member above noise the sum is 0 and the strongest stays.
+        if ((channel.memberMask & channelsAboveNoise) == 0) {
+            values[i] = 0;
+            continue;
+        }
         int32_t sum = 0;
         int32_t strongest = maxPixelIndices[i];
-        // Scanning from last frame's choice keeps it on ties, then the earlier letter.
-        for (const int32_t member : kVirtualChannels.at(i).members()) {
-            const int32_t memberValue = pixels[static_cast<size_t>(member)].value;
-            if (memberValue <= kNoiseLevel) continue;
+        // A member takes over when above noise and above the strongest's value; scanning
+        // from last frame's choice keeps it on ties, then the earlier letter.
+        int32_t takeOverAbove = std::max(kNoiseLevel, pixels[static_cast<size_t>(strongest)].value);
+#pragma GCC unroll 4
+        for (const int32_t member : channel.memberChannels) {
+            const int32_t contribution = contributions[static_cast<size_t>(member)];
             // Wrapping add: a sum of four scaled 16-bit readings cannot overflow, but any
             // input must stay defined.
-            sum = static_cast<int32_t>(static_cast<uint32_t>(sum) + static_cast<uint32_t>(memberValue));
-            if (memberValue > pixels[static_cast<size_t>(strongest)].value) strongest = member;
+            sum = static_cast<int32_t>(static_cast<uint32_t>(sum) + static_cast<uint32_t>(contribution));
+            const bool takesOver = contribution > takeOverAbove;
+            strongest = takesOver ? member : strongest;
+            takeOverAbove = takesOver ? contribution : takeOverAbove;
         }
         values[i] = sum;
         maxPixelIndices[i] = strongest;

@@ -3,17 +3,19 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <limits>
 #include <memory>
 #include <span>
+#include <stdexcept>
 
 namespace ZeltoTouch {
 
 // The bytes of one recorded input report. Reports up to kInlineCapacity bytes (every report
 // the sensor sends) live inside the object, so recording one costs no heap allocation;
-// longer ones go to the heap.
+// longer ones go to the heap, their pointer kept in the inline space. 80 bytes in all.
 class ReportBytes {
 public:
-    static constexpr size_t kInlineCapacity = 80;
+    static constexpr size_t kInlineCapacity = 76;
 
     ReportBytes() noexcept = default;
     ReportBytes(const uint8_t* bytes, size_t length) { assign(bytes, length); }
@@ -28,8 +30,9 @@ public:
         if (this != &other) take(other);
         return *this;
     }
+    ~ReportBytes() { release(); }
 
-    const uint8_t* data() const noexcept { return _heap ? _heap.get() : _inline; }
+    const uint8_t* data() const noexcept { return onHeap() ? heap() : _storage; }
     size_t size() const noexcept { return _size; }
     bool empty() const noexcept { return _size == 0; }
     const uint8_t* begin() const noexcept { return data(); }
@@ -42,27 +45,42 @@ public:
     }
 
 private:
+    bool onHeap() const noexcept { return _size > kInlineCapacity; }
+    uint8_t* heap() const noexcept {
+        uint8_t* pointer;
+        std::memcpy(&pointer, _storage, sizeof pointer);
+        return pointer;
+    }
+    void release() noexcept {
+        if (onHeap()) delete[] heap();
+        _size = 0;
+    }
     void assign(const uint8_t* bytes, size_t length) {
-        if (length > kInlineCapacity) {
-            auto heap = std::make_unique_for_overwrite<uint8_t[]>(length);
-            std::memcpy(heap.get(), bytes, length);
-            _heap = std::move(heap);
-        } else {
-            _heap.reset();
-            if (length) std::memcpy(_inline, bytes, length);
+        if (length > std::numeric_limits<uint32_t>::max()) {
+            throw std::length_error("ReportBytes: a report longer than 4 GiB");
         }
-        _size = length;
+        if (length > kInlineCapacity) {
+            uint8_t* const pointer = std::make_unique_for_overwrite<uint8_t[]>(length).release();
+            std::memcpy(pointer, bytes, length);
+            release();
+            std::memcpy(_storage, &pointer, sizeof pointer);
+        } else {
+            release();
+            if (length) std::memcpy(_storage, bytes, length);
+        }
+        _size = static_cast<uint32_t>(length);
     }
     void take(ReportBytes& other) noexcept {
-        _heap = std::move(other._heap);
-        if (!_heap && other._size) std::memcpy(_inline, other._inline, other._size);
+        release();
+        std::memcpy(_storage, other._storage, other.onHeap() ? sizeof(uint8_t*) : other._size);
         _size = other._size;
         other._size = 0;
     }
 
-    size_t _size = 0;
-    std::unique_ptr<uint8_t[]> _heap;
-    uint8_t _inline[kInlineCapacity];
+    alignas(uint8_t*) uint8_t _storage[kInlineCapacity];  // the bytes, or the heap pointer
+    uint32_t _size = 0;
 };
+
+static_assert(sizeof(ReportBytes) == 80);
 
 }  // namespace ZeltoTouch

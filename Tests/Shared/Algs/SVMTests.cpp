@@ -54,5 +54,29 @@ TEST(SVMTest, ScoreDependsOnRanksNotChannels) {
     EXPECT_EQ(score(values), reference);
 }
 
+// One classifier keeps the previous frame's ranking to start from; whatever came before, a
+// frame scores as it does on a fresh classifier.
+TEST(SVMTest, ScoreDoesNotDependOnEarlierFrames) {
+    std::vector<Pixel> pixels;
+    std::vector<VirtualPixel> virtualPixels;
+    for (int i = 0; i < kPixelCount; ++i) pixels.emplace_back(i, 1.0f);
+    for (int i = 0; i < kVirtualPixelCount; ++i) virtualPixels.emplace_back("A", 1.0f);
+    const auto setFrame = [&](int frame) {
+        for (int i = 0; i < kChannelCount; ++i) {
+            Pixel& pixel = i < kPixelCount ? pixels[i] : virtualPixels[i - kPixelCount];
+            pixel.value = (i * 37 + frame * 101) % 613 - 40 + (i == frame % kChannelCount ? 900 : 0);
+        }
+    };
+    SVM continuing;
+    for (int frame = 0; frame < 60; ++frame) {
+        setFrame(frame);
+        continuing.updateSVMScore(pixels, virtualPixels, 200.0f, 0);
+        SVM fresh;
+        fresh.updateSVMScore(pixels, virtualPixels, 200.0f, 0);
+        EXPECT_NE(fresh.getSVMScore(), 0.0f) << frame;
+        EXPECT_EQ(continuing.getSVMScore(), fresh.getSVMScore()) << frame;
+    }
+}
+
 }  // namespace
 }  // namespace ZeltoTouch
