@@ -8,6 +8,8 @@ packages=(
   libgtest-dev libgmock-dev libbenchmark-dev
   rapidjson-dev libcli11-dev libasio-dev
   systemtap-sdt-dev libevdev-dev libjs-dygraphs
+  chromium
+  clang libclang-rt-14-dev
 )
 
 missing=()

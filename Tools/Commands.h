@@ -10,6 +10,9 @@ void addReplayCommand(CLI::App& app);
 void addRenderCommand(CLI::App& app);
 void addInfoCommand(CLI::App& app);
 void addMigrateCommand(CLI::App& app);
+void addInspectCommand(CLI::App& app);
 void addDemoCommand(CLI::App& app);
+void addRunCommand(CLI::App& app);
+void addDevicesCommand(CLI::App& app);
 
 }  // namespace ZeltoTouch::Tools

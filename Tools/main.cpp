@@ -10,10 +10,13 @@ int main(int argc, char** argv) {
     app.set_help_all_flag("--help-all", "Show the help of every subcommand");
 
     addDemoCommand(app);
+    addRunCommand(app);
+    addDevicesCommand(app);
     addReplayCommand(app);
     addRenderCommand(app);
     addInfoCommand(app);
     addMigrateCommand(app);
+    addInspectCommand(app);
 
     CLI11_PARSE(app, argc, argv);
     return 0;
