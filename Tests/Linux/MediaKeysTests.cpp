@@ -1,0 +1,96 @@
+#include <gtest/gtest.h>
+
+#include "Platform/MediaKeys.h"
+
+namespace ZeltoTouch::Platform {
+namespace {
+
+using namespace std::chrono_literals;
+
+HIDEventRef digitizerEvent(uint32_t mask, uint32_t phase, double region) {
+    auto event = HIDEvent::createDigitizerEvent(0, 2, 0, 0, mask, 0, 0.0, region, 0.0, 0.0, 0.0, false, false, 0);
+    if (phase != 0) event->setPhase(phase);
+    return event;
+}
+
+constexpr uint32_t kTap = 0x20000, kHold = 2;
+constexpr unsigned kHoldKey = KEY_VOICECOMMAND;
+const KeyCommand kNothing{};
+const KeyCommand kStop{KeyAction::StopRepeating, 0};
+KeyCommand press(unsigned key) { return {KeyAction::Press, key}; }
+KeyCommand repeat(unsigned key) { return {KeyAction::PressAndRepeat, key}; }
+
+struct MappingRow {
+    const char* gesture;
+    uint32_t mask;
+    uint32_t phase;
+    double region;
+    KeyCommand expected;
+};
+
+TEST(MediaKeys, MapsEveryGestureAndRegion) {
+    const MappingRow rows[] = {
+        {"tap play/pause", kTap, 0, 1, press(KEY_PLAYPAUSE)},
+        {"tap volume down", kTap, 0, 2, press(KEY_VOLUMEDOWN)},
+        {"tap volume up", kTap, 0, 3, press(KEY_VOLUMEUP)},
+        {"tap without region", kTap, 0, 0, kNothing},
+        {"hold start play/pause", kHold, 1, 1, press(kHoldKey)},
+        {"hold start volume down", kHold, 1, 2, repeat(KEY_VOLUMEDOWN)},
+        {"hold start volume up", kHold, 1, 3, repeat(KEY_VOLUMEUP)},
+        {"hold start without region", kHold, 1, 0, kNothing},
+        {"hold change onto volume up", kHold, 2, 3, repeat(KEY_VOLUMEUP)},
+        {"hold change onto volume down", kHold, 2, 2, repeat(KEY_VOLUMEDOWN)},
+        {"hold change onto play/pause", kHold, 2, 1, kStop},
+        {"hold change off every region", kHold, 2, 0, kStop},
+        {"hold end on volume", kHold, 4, 3, kStop},
+        {"hold end on play/pause", kHold, 4, 1, kStop},
+        {"cancel", 0, 8, 0, kStop},
+        {"may-begin", 0, 128, 1, kNothing},
+        {"unknown hold phase", kHold, 16, 3, kNothing},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(keyCommandForEvent(*digitizerEvent(row.mask, row.phase, row.region), kHoldKey), row.expected)
+            << row.gesture;
+    }
+}
+
+TEST(MediaKeys, TheHoldKeyIsConfigurableAndOnlyEventsOfTheDigitizerCount) {
+    EXPECT_EQ(keyCommandForEvent(*digitizerEvent(kHold, 1, 1), KEY_MUTE), press(KEY_MUTE));
+    EXPECT_EQ(keyCommandForEvent(*digitizerEvent(kHold, 1, 1)), press(KEY_VOICECOMMAND));
+    const auto reset = HIDEvent::createVendorDefinedEvent(0, 0xFF60, 2, 0, nullptr, 0, 0);
+    EXPECT_EQ(keyCommandForEvent(*reset), kNothing);
+}
+
+TEST(KeyRepeatSchedule, RepeatsAtASteadyRateUntilStopped) {
+    KeyRepeatSchedule schedule(250ms);
+    const auto start = KeyRepeatSchedule::Clock::time_point{} + 10s;
+    EXPECT_FALSE(schedule.nextDue());
+    EXPECT_EQ(schedule.apply(repeat(KEY_VOLUMEUP), start), std::vector<unsigned>{KEY_VOLUMEUP});
+    EXPECT_EQ(schedule.nextDue(), start + 250ms);
+    EXPECT_FALSE(schedule.keyDue(start + 249ms));
+    EXPECT_EQ(schedule.keyDue(start + 250ms), KEY_VOLUMEUP);
+    EXPECT_FALSE(schedule.keyDue(start + 260ms));
+    EXPECT_EQ(schedule.keyDue(start + 510ms), KEY_VOLUMEUP);  // a little late: the rate holds
+    EXPECT_EQ(schedule.nextDue(), start + 750ms);
+    EXPECT_EQ(schedule.apply(press(KEY_PLAYPAUSE), start + 600ms), std::vector<unsigned>{KEY_PLAYPAUSE});
+    EXPECT_EQ(schedule.nextDue(), start + 750ms);  // a press leaves the repetition alone
+    EXPECT_EQ(schedule.keyDue(start + 2s), KEY_VOLUMEUP);  // a stalled caller gets one press, not a burst
+    EXPECT_FALSE(schedule.keyDue(start + 2s));
+    EXPECT_EQ(schedule.nextDue(), start + 2250ms);
+    EXPECT_TRUE(schedule.apply(kStop, start + 2100ms).empty());
+    EXPECT_FALSE(schedule.keyDue(start + 3s));
+    EXPECT_FALSE(schedule.nextDue());
+    EXPECT_TRUE(schedule.apply(kNothing, start + 3s).empty());
+}
+
+TEST(KeyRepeatSchedule, AHoldChangeSwitchesTheKeyAndRestartsTheRate) {
+    KeyRepeatSchedule schedule(200ms);
+    const auto start = KeyRepeatSchedule::Clock::time_point{} + 1s;
+    schedule.apply(repeat(KEY_VOLUMEDOWN), start);
+    EXPECT_EQ(schedule.apply(repeat(KEY_VOLUMEUP), start + 150ms), std::vector<unsigned>{KEY_VOLUMEUP});
+    EXPECT_FALSE(schedule.keyDue(start + 200ms));
+    EXPECT_EQ(schedule.keyDue(start + 350ms), KEY_VOLUMEUP);
+}
+
+}  // namespace
+}  // namespace ZeltoTouch::Platform
