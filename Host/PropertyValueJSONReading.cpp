@@ -8,8 +8,14 @@
 #define RAPIDJSON_SSE2
 #endif
 
+#include <charconv>
+#include <clocale>
+#include <cmath>
+#include <cstdlib>
 #include <cstring>
+#include <locale.h>
 #include <memory>
+#include <optional>
 #include <string_view>
 #include <vector>
 
@@ -24,17 +30,48 @@ using Record = PropertyValue::Record;
 
 namespace {
 
+// Integers keep their exact 64-bit value: non-negative ones (and -0) as unsigned, negative ones
+// as signed. Everything else, and integers beyond 64 bits, reads as the nearest double; a number
+// beyond the double range is refused, one below it reads as zero. `text` is NUL-terminated.
+std::optional<PropertyValue> parseNumber(std::string_view text) {
+    const char* end = text.data() + text.size();
+    if (text.find_first_of(".eE") == std::string_view::npos) {
+        if (text.front() == '-') {
+            int64_t value = 0;
+            if (const auto r = std::from_chars(text.data(), end, value); r.ec == std::errc() && r.ptr == end) {
+                if (value == 0) return PropertyValue::fromUInt64(0);
+                return value >= INT32_MIN ? PropertyValue::fromInt32(static_cast<int32_t>(value))
+                                          : PropertyValue::fromInt64(value);
+            }
+        } else {
+            uint64_t value = 0;
+            if (const auto r = std::from_chars(text.data(), end, value); r.ec == std::errc() && r.ptr == end)
+                return PropertyValue::fromUInt64(value);
+        }
+    }
+    double value = 0;
+    const auto r = std::from_chars(text.data(), end, value);
+    if (r.ec == std::errc() && r.ptr == end) return PropertyValue::fromDouble(value);
+    if (r.ec != std::errc::result_out_of_range) return std::nullopt;
+    // Out of range: the C library tells overflow (infinite) from underflow (zero or subnormal).
+    static const locale_t cLocale = newlocale(LC_ALL_MASK, "C", locale_t{});
+    value = strtod_l(text.data(), nullptr, cLocale);
+    if (!std::isfinite(value)) return std::nullopt;
+    return PropertyValue::fromDouble(value);
+}
+
 // SAX handler that builds the tree bottom-up: finished values wait on one stack (keys on
 // another) until their container ends, and each container takes its children in one move.
 class TreeBuilder : public rapidjson::BaseReaderHandler<rapidjson::UTF8<>, TreeBuilder> {
 public:
     bool Null() { return push(PropertyValue::null()); }
     bool Bool(bool b) { return push(PropertyValue::fromBool(b)); }
-    bool Int(int i) { return push(i < 0 ? PropertyValue::fromInt32(i) : PropertyValue::fromUInt64(static_cast<uint64_t>(i))); }
-    bool Uint(unsigned u) { return push(PropertyValue::fromUInt64(u)); }
-    bool Int64(int64_t i) { return push(i < 0 ? PropertyValue::fromInt64(i) : PropertyValue::fromUInt64(static_cast<uint64_t>(i))); }
-    bool Uint64(uint64_t u) { return push(PropertyValue::fromUInt64(u)); }
-    bool Double(double d) { return push(PropertyValue::fromDouble(d)); }
+    // Numbers arrive as text: the reader's own conversion misreads some (a zero with a large
+    // exponent) and turns numbers beyond the double range into infinities.
+    bool RawNumber(const char* text, rapidjson::SizeType length, bool) {
+        std::optional<PropertyValue> number = parseNumber(std::string_view(text, length));
+        return number && push(std::move(*number));
+    }
     // Encoding is checked here rather than by the reader: one pass over the finished string
     // is several times faster than the reader's per-character validation.
     bool String(const char* text, rapidjson::SizeType length, bool) {
@@ -90,7 +127,7 @@ private:
 std::unique_ptr<char[]> paddedCopy(std::string_view text) {
     constexpr size_t kPadding = 16;
     auto buffer = std::make_unique_for_overwrite<char[]>(text.size() + kPadding);
-    std::memcpy(buffer.get(), text.data(), text.size());
+    if (!text.empty()) std::memcpy(buffer.get(), text.data(), text.size());
     std::memset(buffer.get() + text.size(), 0, kPadding);
     return buffer;
 }
@@ -98,7 +135,7 @@ std::unique_ptr<char[]> paddedCopy(std::string_view text) {
 }  // namespace
 
 PropertyValue PropertyValue::fromJSON(std::string_view text) {
-    constexpr unsigned kFlags = rapidjson::kParseFullPrecisionFlag | rapidjson::kParseIterativeFlag;
+    constexpr unsigned kFlags = rapidjson::kParseNumbersAsStringsFlag | rapidjson::kParseIterativeFlag;
     const std::unique_ptr<char[]> buffer = paddedCopy(text);
     rapidjson::StringStream stream(buffer.get());
     TreeBuilder builder;

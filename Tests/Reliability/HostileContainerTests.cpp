@@ -1,0 +1,180 @@
+// Hostile recording containers: huge timestamps, deep nesting, huge arrays, invalid UTF-8 and
+// malformed structure. Each is read into a recording or refused with its documented error;
+// whatever is read writes back into a container that reads as the same frames.
+
+#include <cmath>
+#include <cstdint>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "Shared/Recording/PipelineRecording.h"
+
+namespace ZeltoTouch::Reliability {
+namespace {
+
+using Frame = PipelineRecording::Frame;
+
+std::string repeat(std::string_view text, size_t count) {
+    std::string result;
+    result.reserve(text.size() * count);
+    for (size_t i = 0; i < count; ++i) result += text;
+    return result;
+}
+
+std::string stateFrame(std::string_view timestamp, std::string_view value) {
+    return std::string(R"({"Type":"State","Timestamp":)") + std::string(timestamp) + R"(,"Key":"K","Value":)" +
+           std::string(value) + "}";
+}
+
+std::string container(std::string_view frames, std::string_view version = "2") {
+    return std::string(R"({"Version":)") + std::string(version) + R"(,"Frames":[)" + std::string(frames) + "]}";
+}
+
+PropertyValue jsonData(std::string_view text) {
+    return PropertyValue::data(std::span(reinterpret_cast<const uint8_t*>(text.data()), text.size()));
+}
+
+bool sameFrames(const PipelineRecording& a, const PipelineRecording& b) {
+    if (a.frames().size() != b.frames().size()) return false;
+    auto y = b.frames().begin();
+    for (const Frame& x : a.frames()) {
+        if (x.type != y->type || x.timestamp != y->timestamp || x.key != y->key || !(x.value == y->value) ||
+            !(x.data == y->data)) {
+            return false;
+        }
+        ++y;
+    }
+    return true;
+}
+
+// Reads the text; a recording must survive its own writer. Returns the error text, or "" when read.
+std::string outcome(std::string_view text, size_t* frameCount = nullptr) {
+    try {
+        PipelineRecording recording(jsonData(text));
+        if (frameCount) *frameCount = recording.frames().size();
+        PipelineRecording copy = recording;
+        const PropertyValue written = copy.json();
+        EXPECT_TRUE(written.hasValue()) << "a recording read from JSON must write back";
+        if (written) {
+            EXPECT_TRUE(sameFrames(PipelineRecording(written), copy));
+        }
+        return "";
+    } catch (const std::invalid_argument& error) {
+        return std::string("invalid-argument: ") + error.what();
+    } catch (const std::runtime_error& error) {
+        return std::string("runtime: ") + error.what();
+    }
+}
+
+constexpr const char* kRefused = "runtime: migrateSerializedContainer failed: invalid container";
+
+TEST(HostileContainers, Timestamps) {
+    const struct {
+        const char* timestamp;
+        const char* expected;
+    } cases[] = {
+        {"18446744073709551615", ""},
+        {"18446744073709551616", ""},  // beyond 64 bits: a double, read as a number
+        {"-1", ""},
+        {"-9223372036854775808", ""},
+        {"1.5", ""},
+        {"1e308", ""},
+        {"1e400", kRefused},  // beyond double: not JSON the parser takes
+        {"NaN", kRefused},
+        {"\"5\"", "invalid-argument: invalid frame timestamp"},
+        {"null", "invalid-argument: invalid frame timestamp"},
+    };
+    for (const auto& test : cases) {
+        EXPECT_EQ(outcome(container(stateFrame(test.timestamp, "1"))), test.expected) << test.timestamp;
+    }
+    PipelineRecording largest(jsonData(container(stateFrame("18446744073709551615", "1"))));
+    EXPECT_EQ(largest.frames().front().timestamp, UINT64_MAX);
+}
+
+// Numbers are read as the double nearest to their text, and one beyond the double range is
+// refused like any other number too big: never a NaN, an infinity or another number.
+TEST(HostileContainers, NumbersReadExactlyOrRefused) {
+    const struct {
+        const char* text;
+        double value;  // NaN: refused
+    } cases[] = {
+        {"0e300", 0.0},
+        {"0.000e308", 0.0},
+        {"1.7976931348623157e308", 1.7976931348623157e308},
+        {"4.9e-324", 4.9e-324},
+        {"1.8e308", NAN},
+        {"2e308", NAN},
+        {"184467441e300", NAN},
+    };
+    for (const auto& test : cases) {
+        SCOPED_TRACE(test.text);
+        const std::string text = container(stateFrame("1", test.text));
+        if (std::isnan(test.value)) {
+            EXPECT_EQ(outcome(text), kRefused);
+            continue;
+        }
+        ASSERT_EQ(outcome(text), "");
+        const PipelineRecording recording(jsonData(text));
+        EXPECT_EQ(recording.frames().front().value.toDouble(), test.value);
+    }
+}
+
+TEST(HostileContainers, DeepNesting) {
+    // The container itself takes three levels (object, array, frame object).
+    const size_t allowed = PropertyValue::kMaxJSONDepth - 3;
+    EXPECT_EQ(outcome(container(stateFrame("1", repeat("[", allowed) + repeat("]", allowed)))), "");
+    EXPECT_EQ(outcome(container(stateFrame("1", repeat("[", allowed + 1) + repeat("]", allowed + 1)))), kRefused);
+    EXPECT_EQ(outcome(container(stateFrame("1", repeat("{\"a\":", 600) + "1" + repeat("}", 600)))), kRefused);
+    EXPECT_EQ(outcome(repeat("[", 1'000'000)), kRefused) << "no recursion that a deep document can exhaust";
+}
+
+TEST(HostileContainers, HugeArrays) {
+    size_t frames = 0;
+    EXPECT_EQ(outcome(container(stateFrame("1", "[" + repeat("1,", 299'999) + "1]"))), "");
+    std::string many = stateFrame("1", "null");
+    for (int i = 0; i < 30'000; ++i) many += "," + stateFrame(std::to_string(i), std::to_string(i));
+    EXPECT_EQ(outcome(container(many), &frames), "");
+    EXPECT_EQ(frames, 30'001u);
+    const std::string longReport = R"({"Type":"InputReport","Timestamp":1,"Data":")" + repeat("ab ", 100'000) + "\"}";
+    EXPECT_EQ(outcome(container(longReport), &frames), "");
+}
+
+TEST(HostileContainers, InvalidUTF8IsRefusedWherever) {
+    const std::string sequences[] = {"\xff", "\xc0\xaf", "\xed\xa0\x80", "\xe2\x82", "\xf4\x90\x80\x80"};
+    for (const std::string& bad : sequences) {
+        EXPECT_EQ(outcome(container(R"({"Type":"State","Timestamp":1,"Key":")" + bad + "\"}")), kRefused);
+        EXPECT_EQ(outcome(container(stateFrame("1", "\"" + bad + "\""))), kRefused);
+        EXPECT_EQ(outcome(container(R"({"Type":"InputReport","Timestamp":1,"Data":"01 )" + bad + "\"}")), kRefused);
+        EXPECT_EQ(outcome(container("{\"" + bad + "\":1,\"Type\":\"Metadata\",\"Timestamp\":1,\"Key\":\"k\"}")), kRefused);
+    }
+    EXPECT_EQ(outcome(std::string(R"({"Version":2,"Frames":[]})") + '\0'), kRefused) << "text after a NUL byte";
+}
+
+TEST(HostileContainers, MalformedStructureGetsItsDocumentedError) {
+    const struct {
+        std::string text;
+        const char* expected;
+    } cases[] = {
+        {"", kRefused},
+        {"[]", kRefused},
+        {R"({"Version":"2"})", "runtime: migrateSerializedContainer failed: invalid version"},
+        {R"({"Version":-1})", "runtime: migrateSerializedContainer failed: invalid container version: 18446744073709551615"},
+        {R"({"Version":2,"Frames":{}})", "invalid-argument: invalid frames"},
+        {R"({"Version":2})", "invalid-argument: invalid frames"},
+        {container("1"), "invalid-argument: invalid frame"},
+        {container("1", "1"), "runtime: migrateSerializedContainer failed: frame isn't an object"},
+        {R"({"Version":1,"Frames":7})", "runtime: migrateSerializedContainer failed: Frames isn't an array"},
+        {R"({"Version":0,"Reports":"x"})", "runtime: migrateSerializedContainer failed: Reports isn't an array"},
+        {R"({"Version":0,"Reports":[null]})", "runtime: migrateSerializedContainer failed: frame isn't an object"},
+        {container(R"({"Type":"InputReport","Timestamp":1,"Data":"100"})"), "invalid-argument: invalid hex string"},
+        {container(R"({"Type":"Accel","Timestamp":1})"), "invalid-argument: invalid frame type"},
+        {container(R"({"Type":"Metadata","Timestamp":1,"Key":5})"), "invalid-argument: invalid metadata key"},
+    };
+    for (const auto& test : cases) EXPECT_EQ(outcome(test.text), test.expected) << test.text;
+}
+
+}  // namespace
+}  // namespace ZeltoTouch::Reliability
