@@ -1,7 +1,7 @@
 // printf-style formatting with "%@", over checked arguments.
 //
 // The format is walked one conversion at a time; each numeric conversion is handed to snprintf
-// with a rebuilt specification whose length modifier matches the type actually passed, so a
+// with a rebuilt conversion directive whose length modifier matches the type actually passed, so a
 // mismatched argument can never be undefined behaviour. Rules for mismatches:
 //  - Integer conversions (d i u o x X c p) take any integer, reduced to the width of the length
 //    modifier (hh 8 bits, h 16, none 32, l ll j z t L 64) and read with the conversion's
@@ -86,31 +86,31 @@ constexpr std::string_view kConversions = "diuoxXcsfFeEgGaAp%@n";
 // Parses the conversion starting at format[start] == '%'; nullopt when it is incomplete or
 // names no known conversion.
 std::optional<ConversionSpec> parseConversion(std::string_view format, size_t start) {
-    ConversionSpec spec;
+    ConversionSpec directive;
     size_t i = start + 1;
     while (i < format.size() && std::string_view("-+ #0").find(format[i]) != std::string_view::npos) {
-        spec.flags += format[i++];
+        directive.flags += format[i++];
     }
     if (i < format.size() && format[i] == '*') {
-        spec.widthFromArgument = true;
+        directive.widthFromArgument = true;
         ++i;
     } else if (i < format.size() && format[i] >= '0' && format[i] <= '9') {
-        spec.width = parseDecimal(format, i);
+        directive.width = parseDecimal(format, i);
     }
     if (i < format.size() && format[i] == '.') {
         ++i;
         if (i < format.size() && format[i] == '*') {
-            spec.precisionFromArgument = true;
+            directive.precisionFromArgument = true;
             ++i;
         } else {
-            spec.precision = parseDecimal(format, i);
+            directive.precision = parseDecimal(format, i);
         }
     }
-    spec.length = parseLength(format, i);
+    directive.length = parseLength(format, i);
     if (i >= format.size() || kConversions.find(format[i]) == std::string_view::npos) return std::nullopt;
-    spec.conversion = format[i];
-    spec.end = i + 1;
-    return spec;
+    directive.conversion = format[i];
+    directive.end = i + 1;
+    return directive;
 }
 
 // The numeric reading of an argument, if it has one.
@@ -152,19 +152,19 @@ void appendNaturalText(std::string& out, const FormatArg& arg) {
     std::visit(Visitor{out}, arg.value());
 }
 
-void appendPadded(std::string& out, std::string_view text, const ConversionSpec& spec) {
-    size_t width = spec.width ? static_cast<size_t>(*spec.width) : 0;
+void appendPadded(std::string& out, std::string_view text, const ConversionSpec& directive) {
+    size_t width = directive.width ? static_cast<size_t>(*directive.width) : 0;
     size_t padding = width > text.size() ? width - text.size() : 0;
-    if (!spec.leftAligned()) out.append(padding, ' ');
+    if (!directive.leftAligned()) out.append(padding, ' ');
     out += text;
-    if (spec.leftAligned()) out.append(padding, ' ');
+    if (directive.leftAligned()) out.append(padding, ' ');
 }
 
-void appendText(std::string& out, const FormatArg& arg, const ConversionSpec& spec) {
+void appendText(std::string& out, const FormatArg& arg, const ConversionSpec& directive) {
     std::string text;
     appendNaturalText(text, arg);
-    if (spec.precision && static_cast<size_t>(*spec.precision) < text.size()) text.resize(*spec.precision);
-    appendPadded(out, text, spec);
+    if (directive.precision && static_cast<size_t>(*directive.precision) < text.size()) text.resize(*directive.precision);
+    appendPadded(out, text, directive);
 }
 
 // Integer bits of a numeric argument for an integer conversion of the given signedness.
@@ -196,14 +196,14 @@ double floatingValue(const Numeric& value) {
 
 // "%<flags><width>.<precision><lengthModifier><conversion>" with only the flags that C defines
 // for the conversion.
-std::string snprintfSpec(const ConversionSpec& spec, std::string_view allowedFlags, std::string_view lengthModifier,
+std::string snprintfSpec(const ConversionSpec& directive, std::string_view allowedFlags, std::string_view lengthModifier,
                          char conversion) {
     std::string text = "%";
-    for (char flag : spec.flags) {
+    for (char flag : directive.flags) {
         if (allowedFlags.find(flag) != std::string_view::npos) text += flag;
     }
-    if (spec.width) text += std::to_string(*spec.width);
-    if (spec.precision) text += "." + std::to_string(*spec.precision);
+    if (directive.width) text += std::to_string(*directive.width);
+    if (directive.precision) text += "." + std::to_string(*directive.precision);
     text += lengthModifier;
     text += conversion;
     return text;
@@ -225,27 +225,27 @@ void appendSnprintf(std::string& out, const std::string& cSpec, T value) {
     }
 }
 
-void appendInteger(std::string& out, const Numeric& value, const ConversionSpec& spec) {
-    char conversion = spec.conversion;
+void appendInteger(std::string& out, const Numeric& value, const ConversionSpec& directive) {
+    char conversion = directive.conversion;
     bool isSigned = conversion == 'd' || conversion == 'i';
-    uint64_t bits = resized(integerBits(value, isSigned), spec.length, isSigned);
+    uint64_t bits = resized(integerBits(value, isSigned), directive.length, isSigned);
     if (isSigned) {
-        appendSnprintf(out, snprintfSpec(spec, "-+ 0", "ll", conversion), static_cast<long long>(bits));
+        appendSnprintf(out, snprintfSpec(directive, "-+ 0", "ll", conversion), static_cast<long long>(bits));
         return;
     }
     std::string_view flags = "-+ #0";
     if (conversion == 'p') {
-        if (bits == 0) return appendPadded(out, "(nil)", spec);
+        if (bits == 0) return appendPadded(out, "(nil)", directive);
         conversion = 'x';
         flags = "-+ 0";
         out += "0x";
     }
-    appendSnprintf(out, snprintfSpec(spec, flags, "ll", conversion), static_cast<unsigned long long>(bits));
+    appendSnprintf(out, snprintfSpec(directive, flags, "ll", conversion), static_cast<unsigned long long>(bits));
 }
 
-void appendCharacter(std::string& out, const Numeric& value, const ConversionSpec& spec) {
+void appendCharacter(std::string& out, const Numeric& value, const ConversionSpec& directive) {
     char c = static_cast<char>(static_cast<unsigned char>(integerBits(value, true)));
-    appendPadded(out, std::string_view(&c, 1), spec);
+    appendPadded(out, std::string_view(&c, 1), directive);
 }
 
 // Takes the next argument as a field width or precision; nullopt when there is none left.
@@ -269,30 +269,30 @@ private:
 };
 
 // Fills in widths and precisions given as arguments; false when an argument is missing.
-bool resolveFieldArguments(ConversionSpec& spec, ArgumentCursor& cursor) {
-    if (spec.widthFromArgument) {
+bool resolveFieldArguments(ConversionSpec& directive, ArgumentCursor& cursor) {
+    if (directive.widthFromArgument) {
         auto width = intArgument(cursor.next());
         if (!width) return false;
-        if (*width < 0) spec.flags += '-';  // a negative width means left alignment
-        spec.width = *width < 0 ? -*width : *width;
+        if (*width < 0) directive.flags += '-';  // a negative width means left alignment
+        directive.width = *width < 0 ? -*width : *width;
     }
-    if (spec.precisionFromArgument) {
+    if (directive.precisionFromArgument) {
         auto precision = intArgument(cursor.next());
         if (!precision) return false;
-        if (*precision >= 0) spec.precision = precision;  // a negative precision counts as none
+        if (*precision >= 0) directive.precision = precision;  // a negative precision counts as none
     }
-    if (spec.width) spec.width = std::min(*spec.width, kMaxFieldWidth);
-    if (spec.precision) spec.precision = std::min(*spec.precision, kMaxFieldWidth);
+    if (directive.width) directive.width = std::min(*directive.width, kMaxFieldWidth);
+    if (directive.precision) directive.precision = std::min(*directive.precision, kMaxFieldWidth);
     return true;
 }
 
-void appendConversion(std::string& out, ConversionSpec& spec, ArgumentCursor& cursor) {
-    if (spec.conversion == '%') {
+void appendConversion(std::string& out, ConversionSpec& directive, ArgumentCursor& cursor) {
+    if (directive.conversion == '%') {
         out += '%';
         return;
     }
-    if (spec.conversion == 'n') return;
-    if (!resolveFieldArguments(spec, cursor)) {
+    if (directive.conversion == 'n') return;
+    if (!resolveFieldArguments(directive, cursor)) {
         out += kMissing;
         return;
     }
@@ -301,11 +301,11 @@ void appendConversion(std::string& out, ConversionSpec& spec, ArgumentCursor& cu
         out += kMissing;
         return;
     }
-    if (spec.conversion == 's' || spec.conversion == '@') return appendText(out, *arg, spec);
+    if (directive.conversion == 's' || directive.conversion == '@') return appendText(out, *arg, directive);
     auto numeric = numericValue(*arg);
-    if (!numeric) return appendText(out, *arg, spec);
-    switch (spec.conversion) {
-        case 'c': return appendCharacter(out, *numeric, spec);
+    if (!numeric) return appendText(out, *arg, directive);
+    switch (directive.conversion) {
+        case 'c': return appendCharacter(out, *numeric, directive);
         case 'f':
         case 'F':
         case 'e':
@@ -313,8 +313,8 @@ void appendConversion(std::string& out, ConversionSpec& spec, ArgumentCursor& cu
         case 'g':
         case 'G':
         case 'a':
-        case 'A': return appendSnprintf(out, snprintfSpec(spec, "-+ #0", "", spec.conversion), floatingValue(*numeric));
-        default: return appendInteger(out, *numeric, spec);
+        case 'A': return appendSnprintf(out, snprintfSpec(directive, "-+ #0", "", directive.conversion), floatingValue(*numeric));
+        default: return appendInteger(out, *numeric, directive);
     }
 }
 
@@ -330,15 +330,15 @@ void appendFormatv(std::string& out, std::string_view format, std::span<const Fo
             return;
         }
         out.append(format.substr(i, percent - i));
-        auto spec = parseConversion(format, percent);
-        if (!spec) {
+        auto directive = parseConversion(format, percent);
+        if (!directive) {
             // Not a conversion: copy the '%' and carry on with what follows it.
             out += '%';
             i = percent + 1;
             continue;
         }
-        appendConversion(out, *spec, cursor);
-        i = spec->end;
+        appendConversion(out, *directive, cursor);
+        i = directive->end;
     }
 }
 
