@@ -74,24 +74,25 @@ SensorReportGenerator::SensorReportGenerator(GestureScript script, Options optio
         if (step.resetAfterMs) _resetTimesMs.push_back(start + *step.resetAfterMs);
         start += step.durationMs;
     }
+    _durationMs = start;
     std::stable_sort(_resetTimesMs.begin(), _resetTimesMs.end());
 }
 
 // A reset comes before the frame at its time; resets after the last frame still come.
 bool SensorReportGenerator::resetIsNext() const {
     return _nextReset < _resetTimesMs.size() &&
-           (_resetTimesMs[_nextReset] <= _nextFrameMs || _nextFrameMs >= _script.durationMs());
+           (_resetTimesMs[_nextReset] <= _nextFrameMs || _nextFrameMs >= _durationMs);
 }
 
 std::optional<uint32_t> SensorReportGenerator::nextReportTimeMs() const {
     if (resetIsNext()) return _resetTimesMs[_nextReset];
-    if (_nextFrameMs < _script.durationMs()) return static_cast<uint32_t>(_nextFrameMs);
+    if (_nextFrameMs < _durationMs) return static_cast<uint32_t>(_nextFrameMs);
     return std::nullopt;
 }
 
 std::optional<SimulatedReport> SensorReportGenerator::next() {
     if (resetIsNext()) return resetReport(_resetTimesMs[_nextReset++]);
-    if (_nextFrameMs >= _script.durationMs()) return std::nullopt;
+    if (_nextFrameMs >= _durationMs) return std::nullopt;
     const auto timeMs = static_cast<uint32_t>(_nextFrameMs);
     _nextFrameMs += _options.framePeriodMs;
     return imageReport(timeMs);

@@ -55,6 +55,7 @@ private:
     Options _options;
     std::vector<uint32_t> _stepStartsMs;
     std::vector<uint32_t> _resetTimesMs;  // ascending
+    uint32_t _durationMs = 0;             // the script's, summed once
     size_t _nextReset = 0;
     uint64_t _nextFrameMs = 0;
     uint32_t _frameNumber = 0;
