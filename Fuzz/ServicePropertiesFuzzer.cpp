@@ -2,7 +2,7 @@
 // scheduled on a simulated sensor that plays gestures in real time, so every write races the
 // input report thread. Beyond surviving: a Pipeline-domain write is accepted, a written
 // parameter reads back as the documented conversion of what was written, and the recording
-// stays readable as a container unless a write put something into it that JSON cannot hold.
+// always reads back as a container.
 
 #include <atomic>
 #include <cmath>
@@ -17,7 +17,6 @@
 #include <fuzzer/FuzzedDataProvider.h>
 
 #include "Fuzz/FuzzedValues.h"
-#include "Host/UTF8.h"
 #include "Platform/DeviceRegistry.h"
 #include "Platform/DispatchQueue.h"
 #include "Platform/GestureScript.h"
@@ -92,8 +91,6 @@ public:
     LiveService& operator=(const LiveService&) = delete;
 
     ZeltoTouchHIDService& service() { return *_service; }
-    // Set once a write put into the recording something the container cannot hold.
-    bool recordingUnwritable = false;
 
 private:
     std::shared_ptr<Platform::SimulatedSensor> _device;
@@ -104,7 +101,7 @@ private:
 
 // A fresh service every so many inputs: bounds what the device's property store and the
 // recording accumulate, and runs the lifecycle again and again under load.
-constexpr uint64_t kInputsPerService = 250;
+constexpr uint64_t kInputsPerService = 40;
 
 std::unique_ptr<LiveService>& liveService() {
     static std::unique_ptr<LiveService> live;
@@ -146,7 +143,6 @@ void checkReadBack(ZeltoTouchHIDService& service, std::string_view key, const Pr
 
 void checkRecording(LiveService& live) {
     const PropertyValue text = live.service().getPropertyForKey(PropertyValue::string("Recording"));
-    if (live.recordingUnwritable) return;
     if (!text.isString()) fail("the recording is not readable");
     try {
         PipelineRecording reread(text);
@@ -164,7 +160,6 @@ void setAndCheck(LiveService& live, const PropertyValue& key, const PropertyValu
     const std::string_view name = key.stringView();
     if (!name.starts_with("Pipeline.")) return;
     if (!accepted) fail("a Pipeline write was refused:", name);
-    if (!isValidUTF8(name.substr(9)) || (value && !value.toJSON())) live.recordingUnwritable = true;
     if (name.starts_with(kPipelineAlgs)) checkReadBack(live.service(), name, value);
 }
 

@@ -110,16 +110,17 @@ PropertyValue ZeltoTouchHIDService::factoryResetHoldDuration() const {
 }
 
 // Copied under the lock, serialised outside it: report processing waits only for the copy.
+// A write of a value JSON cannot hold (data, NaN, a key that is not UTF-8) still reaches the
+// pipeline and the recording; leaving just that frame out keeps the rest of the recording
+// readable.
 PropertyValue ZeltoTouchHIDService::recordingJSON() {
     std::unique_lock lock(_pipelineLock);
     PipelineRecording copy = _recording;
     lock.unlock();
-    try {
-        return PropertyValue::stringFromData(copy.jsonOrThrow());
-    } catch (const std::runtime_error& error) {
-        _log.error("Failed to serialise the recording: %s", error.what());
-        return {};
-    }
+    size_t leftOut = 0;
+    PropertyValue text = PropertyValue::stringFromData(copy.jsonLeavingOutUnwritable(leftOut));
+    if (leftOut > 0) _log.error("Recording: left out %zu frames that JSON cannot represent", leftOut);
+    return text;
 }
 
 // Each sub-key is read on its own, so the lock is taken separately for each.

@@ -1,10 +1,12 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <list>
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "Host/PropertyValue.h"
 #include "Shared/Pipeline/PipelineInput.h"
@@ -71,6 +73,8 @@ public:
     PropertyValue json();
     // As json(), but says why it fails: std::runtime_error naming the offending frame.
     PropertyValue jsonOrThrow();
+    // As json(), but leaves out the frames JSON cannot hold instead of failing, and counts them.
+    PropertyValue jsonLeavingOutUnwritable(size_t& leftOut);
     // Turns a parsed container of version 0, 1 or 2 into version 2; throws std::invalid_argument.
     static PropertyValue migrateSerializedContainer(const PropertyValue& container);
 
@@ -92,6 +96,9 @@ private:
 
     void endPlayback() noexcept { _play.valid = false; }
     void copyCursorFrom(const PipelineRecording& other);
+    // Called with a frame's index, the frame and why JSON cannot hold it.
+    using UnwritableFrameHandler = std::function<void(size_t, const Frame&, std::string_view)>;
+    PropertyValue writeContainer(const UnwritableFrameHandler& unwritable);
 
     FrameList _frames;
     uint64_t _maxFrameCount = 0;

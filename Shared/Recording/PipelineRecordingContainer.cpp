@@ -1,4 +1,6 @@
 #include <cstdint>
+#include <functional>
+#include <optional>
 #include <span>
 #include <stdexcept>
 #include <string>
@@ -42,36 +44,50 @@ void writeString(JSONWriter& writer, std::string_view text) {
     writer.String(text.data(), static_cast<rapidjson::SizeType>(text.size()));
 }
 
-// Writes one frame object. `scratch` is reused for the hex text of reports. Throws
-// std::runtime_error when the frame holds something JSON cannot represent.
-void writeFrame(JSONWriter& writer, const Frame& frame, size_t index, std::string& scratch) {
-    const auto refuse = [&](std::string_view what) {
-        throw std::runtime_error("cannot write frame " + std::to_string(index) + " (" + std::string(typeName(frame.type)) +
-                                 " \"" + frame.key + "\"): " + std::string(what));
-    };
-    writer.StartObject();
-    writer.Key("Type");
-    writeString(writer, typeName(frame.type));
-    writer.Key("Timestamp");
-    writer.Uint64(frame.timestamp);
-    if (frame.type == Frame::Type::InputReport) {
-        // Hex text needs no escaping, so it goes in raw.
-        scratch.assign(1, '"');
-        Util::appendHexText(scratch, frame.data);
-        scratch += '"';
-        writer.Key("Data");
-        writer.RawValue(scratch.data(), scratch.size(), rapidjson::kStringType);
-    } else {
-        if (!isValidUTF8(frame.key)) refuse("its key is not valid UTF-8");
-        writer.Key("Key");
-        writeString(writer, frame.key);
-        if (frame.value) {
-            writer.Key("Value");
-            if (!writeJSON(writer, frame.value, 2)) refuse("its value cannot be represented in JSON");
+// Writes frame objects into the container. A State or Metadata value is written to a scratch
+// buffer first, so a frame that JSON cannot hold is found before any of it reaches the container.
+class FrameWriter {
+public:
+    explicit FrameWriter(JSONWriter& writer) : _writer(writer), _valueWriter(_value) {}
+
+    // Writes the frame, or writes nothing and says why JSON cannot hold it.
+    std::optional<std::string_view> write(const Frame& frame) {
+        if (frame.type != Frame::Type::InputReport) {
+            if (!isValidUTF8(frame.key)) return "its key is not valid UTF-8";
+            _value.Clear();
+            _valueWriter.Reset(_value);
+            if (frame.value && !writeJSON(_valueWriter, frame.value, 2)) return "its value cannot be represented in JSON";
         }
+        _writer.StartObject();
+        _writer.Key("Type");
+        writeString(_writer, typeName(frame.type));
+        _writer.Key("Timestamp");
+        _writer.Uint64(frame.timestamp);
+        if (frame.type == Frame::Type::InputReport) {
+            // Hex text needs no escaping, so it goes in raw.
+            _hex.assign(1, '"');
+            Util::appendHexText(_hex, frame.data);
+            _hex += '"';
+            _writer.Key("Data");
+            _writer.RawValue(_hex.data(), _hex.size(), rapidjson::kStringType);
+        } else {
+            _writer.Key("Key");
+            writeString(_writer, frame.key);
+            if (frame.value) {
+                _writer.Key("Value");
+                _writer.RawValue(_value.GetString(), _value.GetSize(), rapidjson::kObjectType);
+            }
+        }
+        _writer.EndObject();
+        return std::nullopt;
     }
-    writer.EndObject();
-}
+
+private:
+    JSONWriter& _writer;
+    rapidjson::StringBuffer _value;
+    JSONWriter _valueWriter;
+    std::string _hex;
+};
 
 // ---- Reading ----
 
@@ -174,6 +190,18 @@ PropertyValue PipelineRecording::json() {
 }
 
 PropertyValue PipelineRecording::jsonOrThrow() {
+    return writeContainer([](size_t index, const Frame& frame, std::string_view why) {
+        throw std::runtime_error("cannot write frame " + std::to_string(index) + " (" + std::string(typeName(frame.type)) +
+                                 " \"" + frame.key + "\"): " + std::string(why));
+    });
+}
+
+PropertyValue PipelineRecording::jsonLeavingOutUnwritable(size_t& leftOut) {
+    leftOut = 0;
+    return writeContainer([&leftOut](size_t, const Frame&, std::string_view) { ++leftOut; });
+}
+
+PropertyValue PipelineRecording::writeContainer(const UnwritableFrameHandler& unwritable) {
     if (_maxFrameCount != 0) trimFrames(_frames, _maxFrameCount);
     sortFrames(_frames);
     endPlayback();
@@ -185,9 +213,12 @@ PropertyValue PipelineRecording::jsonOrThrow() {
     writer.Uint64(kContainerVersion);
     writer.Key("Frames");
     writer.StartArray();
-    std::string scratch;
+    FrameWriter frames(writer);
     size_t index = 0;
-    for (const Frame& frame : _frames) writeFrame(writer, frame, index++, scratch);
+    for (const Frame& frame : _frames) {
+        if (const auto why = frames.write(frame)) unwritable(index, frame, *why);
+        ++index;
+    }
     writer.EndArray();
     writer.EndObject();
     return PropertyValue::data(std::span(reinterpret_cast<const uint8_t*>(buffer.GetString()), buffer.GetSize()));

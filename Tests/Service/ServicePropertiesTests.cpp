@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cmath>
 #include <string>
 #include <vector>
 
@@ -123,11 +124,19 @@ TEST_F(ServiceProperties, RecordingIsTheContainerOfEverythingRecorded) {
     EXPECT_EQ(logCapture().countEqual("getPropertyForKey:Recording"), 1u);
 }
 
-TEST_F(ServiceProperties, ARecordingThatCannotBeSerialisedReadsAsNoValueWithAnError) {
-    // Data has no JSON form; a state write carrying it makes the container impossible.
+TEST_F(ServiceProperties, WritesJSONCannotHoldAreLeftOutOfTheRecordingWithAnError) {
+    // Data and NaN have no JSON form; they still reach the pipeline, but only the frames that
+    // can be written make up the container.
     ASSERT_TRUE(set("Pipeline.Algs.Blob", PropertyValue::data(std::vector<uint8_t>{1, 2})));
-    EXPECT_FALSE(get("Recording").hasValue());
-    EXPECT_EQ(logCapture().countContaining("Failed to serialise the recording"), 1u);
+    ASSERT_TRUE(set("Pipeline.Algs.ActivationThreshold", PropertyValue::fromDouble(std::nan(""))));
+    ASSERT_TRUE(set("Pipeline.Algs.EnableTapSuppression", PropertyValue::fromBool(false)));
+    const PropertyValue text = get("Recording");
+    ASSERT_TRUE(text.isString());
+    const PipelineRecording loaded(PropertyValue::data(
+        std::span(reinterpret_cast<const uint8_t*>(text.stringView().data()), text.length())));
+    ASSERT_EQ(loaded.frames().size(), 1u);
+    EXPECT_EQ(loaded.frames().front().key, "Algs.EnableTapSuppression");
+    EXPECT_EQ(logCapture().countContaining("Recording: left out 2 frames that JSON cannot represent"), 1u);
 }
 
 TEST_F(ServiceProperties, ServicePluginDebugCombinesFiveKeys) {

@@ -68,25 +68,42 @@ TEST(ContainerWriting, TrimsWithTheLimitAndSortsTheRecordingItself) {
     EXPECT_EQ(PipelineRecording(limited.json()).frames().size(), 2u);
 }
 
-TEST(ContainerWriting, ValueJSONCannotHoldFailsClearly) {
+TEST(ContainerWriting, FrameJSONCannotHoldFailsClearlyOrIsLeftOut) {
     const std::vector<uint8_t> bytes{1};
-    for (const PropertyValue& value :
-         {PropertyValue::data(std::span<const uint8_t>(bytes)), PropertyValue::fromDouble(std::nan("")),
-          PropertyValue::dictionary({{"Inner", PropertyValue::data(std::span<const uint8_t>(bytes))}})}) {
+    struct Case {
+        Frame frame;
+        const char* error;
+    };
+    const Case cases[] = {
+        {metadataFrame(2, "Bad", PropertyValue::data(std::span<const uint8_t>(bytes))),
+         "cannot write frame 1 (Metadata \"Bad\"): its value cannot be represented in JSON"},
+        {stateFrame(2, "Bad", PropertyValue::fromDouble(std::nan(""))),
+         "cannot write frame 1 (State \"Bad\"): its value cannot be represented in JSON"},
+        {metadataFrame(2, "Bad", PropertyValue::dictionary({{"Inner", PropertyValue::data(std::span<const uint8_t>(bytes))}})),
+         "cannot write frame 1 (Metadata \"Bad\"): its value cannot be represented in JSON"},
+        {stateFrame(2, "\xff", {}), "cannot write frame 1 (State \"\xff\"): its key is not valid UTF-8"},
+    };
+    for (const Case& test : cases) {
         PipelineRecording recording;
         recording.appendFrame(reportFrame(1, {1}));
-        recording.appendFrame(metadataFrame(2, "Bad", value));
+        recording.appendFrame(test.frame);
+        recording.appendFrame(stateFrame(3, "After", PropertyValue::fromInt32(7)));
         EXPECT_FALSE(recording.json().hasValue());
         try {
             recording.jsonOrThrow();
             ADD_FAILURE() << "no error";
         } catch (const std::runtime_error& error) {
-            EXPECT_STREQ(error.what(), "cannot write frame 1 (Metadata \"Bad\"): its value cannot be represented in JSON");
+            EXPECT_STREQ(error.what(), test.error);
         }
+
+        size_t leftOut = 0;
+        const PipelineRecording rest(recording.jsonLeavingOutUnwritable(leftOut));
+        EXPECT_EQ(leftOut, 1u);
+        ASSERT_EQ(rest.frames().size(), 2u);
+        EXPECT_EQ(rest.frames().front().data, ReportBytes(Bytes{1}));
+        EXPECT_EQ(rest.frames().back().key, "After");
+        EXPECT_EQ(rest.frames().back().value, PropertyValue::fromInt32(7));
     }
-    PipelineRecording badKey;
-    badKey.appendFrame(stateFrame(1, "\xff", {}));
-    EXPECT_FALSE(badKey.json().hasValue());
 }
 
 TEST(ContainerRoundTrip, ReaderGivesBackEveryFrameField) {
