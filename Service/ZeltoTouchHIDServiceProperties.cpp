@@ -114,8 +114,12 @@ PropertyValue ZeltoTouchHIDService::factoryResetHoldDuration() const {
 // pipeline and the recording; leaving just that frame out keeps the rest of the recording
 // readable.
 PropertyValue ZeltoTouchHIDService::recordingJSON() {
+    // Trimming keeps the recording below twice its limit (unless a flood of distinct state
+    // keys holds it above), so the copy made under the lock writes only to resident memory.
+    PipelineRecording copy;
+    copy.reserveFrames(2 * kMaxRecordedFrames);
     std::unique_lock lock(_pipelineLock);
-    PipelineRecording copy = _recording;
+    copy = _recording;
     lock.unlock();
     size_t leftOut = 0;
     PropertyValue text = PropertyValue::stringFromData(copy.jsonLeavingOutUnwritable(leftOut));

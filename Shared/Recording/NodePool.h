@@ -27,6 +27,16 @@ public:
     }
     void deallocate(void* block) noexcept { _freeBlocks = new (block) FreeBlock{_freeBlocks}; }
 
+    // Puts at least `count` blocks on the free list, once the first allocation has fixed their
+    // size. Each block is written on the way, so its page is resident: the next `count`
+    // allocations neither call the heap nor fault a page in.
+    void reserve(size_t count) {
+        if (_blockSize == 0) return;
+        std::vector<void*> blocks(count);
+        for (void*& block : blocks) block = allocate(_blockSize);
+        for (void* block : blocks) deallocate(block);
+    }
+
     // The block size this pool serves, once fixed by its first allocation (0 before).
     bool serves(size_t blockSize) const noexcept { return _blockSize == 0 || _blockSize == roundUp(blockSize); }
 
@@ -82,6 +92,9 @@ public:
         ::operator delete(pointer, std::align_val_t{alignof(T)});
     }
     PoolAllocator select_on_container_copy_construction() const { return PoolAllocator(); }
+
+    // Room for `count` more nodes, once the container has allocated its first one.
+    void reserve(size_t count) { _pool->reserve(count); }
 
     template <typename U>
     friend bool operator==(const PoolAllocator& a, const PoolAllocator<U>& b) noexcept {

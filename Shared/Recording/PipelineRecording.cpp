@@ -15,6 +15,13 @@ PipelineRecording::PipelineRecording(const PipelineRecording& other)
     copyCursorFrom(other);
 }
 
+void PipelineRecording::reserveFrames(size_t count) {
+    // One node in and out fixes the pool's block size to the list's node.
+    _frames.emplace_back();
+    _frames.pop_back();
+    _frames.get_allocator().reserve(count);
+}
+
 PipelineRecording::PipelineRecording(PipelineRecording&& other) noexcept { *this = std::move(other); }
 
 PipelineRecording& PipelineRecording::operator=(const PipelineRecording& other) {

@@ -60,6 +60,9 @@ public:
     void setMaxFrameCount(uint64_t count);
     uint64_t maxFrameCount() const noexcept { return _maxFrameCount; }
     const FrameList& frames() const noexcept { return _frames; }
+    // Room for `count` frames in memory that is already paged in, so that assigning a
+    // recording of up to that many frames to this one (under a lock, say) is only copying.
+    void reserveFrames(size_t count);
 
     // Keeps the newest maxFrameCount InputReport and Metadata frames and, of the State frames
     // between two kept ones (and before the oldest), the newest of each key.
