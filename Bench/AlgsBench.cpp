@@ -3,6 +3,7 @@
 
 #include <vector>
 
+#include "Bench/SessionReports.h"
 #include "Shared/Algs/Algs.h"
 
 namespace ZeltoTouch {
@@ -42,7 +43,8 @@ void runFrames(benchmark::State& state, const std::vector<InputReport::Image>& f
         benchmark::DoNotOptimize(algs.handleImage(image));
         if (++next == frames.size()) {
             next = 0;
-            timeOffset += frames.size() * kFramePeriodMs;  // keep the clock running forward
+            // keep the clock running forward
+            timeOffset += frames.back().timestampMs - frames.front().timestampMs + kFramePeriodMs;
         }
     }
     state.SetItemsProcessed(state.iterations());
@@ -59,9 +61,20 @@ void BM_AlgsFrame_Touching(benchmark::State& state) {
     runFrames(state, frames);
 }
 
+// The simulated sensor's session, the input of the report-through-recording benchmark: noisy
+// frames with taps, holds, slides, a brush and a palm over several regions.
+void BM_AlgsFrame_SensorSession(benchmark::State& state) {
+    std::vector<InputReport::Image> frames;
+    for (const Platform::SimulatedReport& report : Bench::sessionReports(20)) {
+        if (auto image = InputReport::Image::parse(report.bytes.data(), report.bytes.size())) frames.push_back(*image);
+    }
+    runFrames(state, frames);
+}
+
 BENCHMARK(BM_AlgsFrame_RealisticMix)->Repetitions(9)->ReportAggregatesOnly(true);
 BENCHMARK(BM_AlgsFrame_Idle)->Repetitions(9)->ReportAggregatesOnly(true);
 BENCHMARK(BM_AlgsFrame_Touching)->Repetitions(9)->ReportAggregatesOnly(true);
+BENCHMARK(BM_AlgsFrame_SensorSession)->Repetitions(9)->ReportAggregatesOnly(true);
 
 }  // namespace
 }  // namespace ZeltoTouch
