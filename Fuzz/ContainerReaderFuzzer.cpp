@@ -1,13 +1,18 @@
 // Arbitrary text into the recording container reader. It either yields a recording, which must
 // write back into a container that reads as the same frames, or raises one of its documented
 // errors; any other outcome (another exception, another message, a crash) is a finding.
+// The reader takes the containers our writer produces straight from the text and everything
+// else through the parsed tree; the two ways must agree, so the same JSON with its keys sorted
+// (which puts "Frames" before "Version" and so can only go the tree's way) must read the same.
 
 #include <array>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
+#include <optional>
 #include <span>
 #include <stdexcept>
+#include <string>
 #include <string_view>
 
 #include "Shared/Recording/PipelineRecording.h"
@@ -66,23 +71,44 @@ bool sameFrames(const PipelineRecording::FrameList& a, const PipelineRecording::
     return true;
 }
 
-}  // namespace
+// What reading a container gave: its frames, or the message of the error it raised.
+struct Outcome {
+    std::optional<PipelineRecording> recording;
+    std::string error;
+};
 
-extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    const PropertyValue text = PropertyValue::data(std::span(data, size));
+Outcome read(const PropertyValue& text) {
     try {
-        PipelineRecording recording(text);
-        // The writer sorts; what it writes must read back as the sorted frames, unchanged.
-        PropertyValue written = recording.json();
-        if (!written) fail("a recording read from JSON could not be written back");
-        if (!sameFrames(PipelineRecording(written).frames(), recording.frames())) fail("write and read disagree");
+        return {PipelineRecording(text), {}};
     } catch (const std::invalid_argument& error) {
         if (!isReaderMessage(error.what())) fail("undocumented invalid-argument error:", error.what());
+        return {std::nullopt, error.what()};
     } catch (const std::runtime_error& error) {
         const std::string_view message = error.what();
         if (!message.starts_with(kMigrationFailed) || !isMigrationMessage(message.substr(kMigrationFailed.size()))) {
             fail("undocumented runtime error:", message);
         }
+        return {std::nullopt, error.what()};
+    }
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+    const PropertyValue text = PropertyValue::data(std::span(data, size));
+    Outcome outcome = read(text);
+    if (const PropertyValue tree = PropertyValue::fromJSON(text)) {
+        const Outcome sorted = read(tree.toJSON());
+        if (sorted.error != outcome.error) fail("the sorted container reads differently:", sorted.error);
+        if (sorted.recording && !sameFrames(sorted.recording->frames(), outcome.recording->frames())) {
+            fail("the sorted container reads as other frames");
+        }
+    }
+    if (outcome.recording) {
+        // The writer sorts; what it writes must read back as the sorted frames, unchanged.
+        const PropertyValue written = outcome.recording->json();
+        if (!written) fail("a recording read from JSON could not be written back");
+        if (!sameFrames(PipelineRecording(written).frames(), outcome.recording->frames())) fail("write and read disagree");
     }
     return 0;
 }

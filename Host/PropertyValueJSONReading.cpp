@@ -1,5 +1,5 @@
-// JSON text form of PropertyValue, reading: RapidJSON's SAX reader builds the tree directly,
-// with no intermediate DOM.
+// JSON reading: RapidJSON's SAX reader hands its events to a JSONEventHandler, and
+// JSONValueBuilder builds PropertyValue trees from them directly, with no intermediate DOM.
 //
 // The reader scans strings sixteen bytes at a time. Its SIMD paths are switched on here, in the
 // only file that includes the reader, so every use of it sees the same definitions (the writer's
@@ -21,6 +21,7 @@
 
 #include <rapidjson/reader.h>
 
+#include "Host/JSONReader.h"
 #include "Host/PropertyValueRecord.h"
 #include "Host/UTF8.h"
 
@@ -60,65 +61,39 @@ std::optional<PropertyValue> parseNumber(std::string_view text) {
     return PropertyValue::fromDouble(value);
 }
 
-// SAX handler that builds the tree bottom-up: finished values wait on one stack (keys on
-// another) until their container ends, and each container takes its children in one move.
-class TreeBuilder : public rapidjson::BaseReaderHandler<rapidjson::UTF8<>, TreeBuilder> {
+// Hands RapidJSON's events to a JSONEventHandler, checking what every handler relies on:
+// encoding (one pass over a finished string is several times faster than the reader's
+// per-character validation) and depth.
+class EventForwarder : public rapidjson::BaseReaderHandler<rapidjson::UTF8<>, EventForwarder> {
 public:
-    bool Null() { return push(PropertyValue::null()); }
-    bool Bool(bool b) { return push(PropertyValue::fromBool(b)); }
+    explicit EventForwarder(JSONEventHandler& handler) : _handler(handler) {}
+
+    bool Null() { return _handler.null(); }
+    bool Bool(bool b) { return _handler.boolean(b); }
     // Numbers arrive as text: the reader's own conversion misreads some (a zero with a large
     // exponent) and turns numbers beyond the double range into infinities.
-    bool RawNumber(const char* text, rapidjson::SizeType length, bool) {
-        std::optional<PropertyValue> number = parseNumber(std::string_view(text, length));
-        return number && push(std::move(*number));
-    }
-    // Encoding is checked here rather than by the reader: one pass over the finished string
-    // is several times faster than the reader's per-character validation.
+    bool RawNumber(const char* text, rapidjson::SizeType length, bool) { return _handler.number({text, length}); }
     bool String(const char* text, rapidjson::SizeType length, bool) {
-        std::string_view view(text, length);
-        return isValidUTF8(view) && push(Record::make<std::string>(false, view));
+        const std::string_view view(text, length);
+        return isValidUTF8(view) && _handler.string(view);
     }
     bool Key(const char* text, rapidjson::SizeType length, bool) {
-        std::string_view view(text, length);
-        if (!isValidUTF8(view)) return false;
-        _keys.emplace_back(view);
-        return true;
+        const std::string_view view(text, length);
+        return isValidUTF8(view) && _handler.key(view);
     }
-    bool StartObject() { return open(); }
-    bool StartArray() { return open(); }
-    bool EndArray(rapidjson::SizeType count) {
-        std::vector<PropertyValue> elements(std::make_move_iterator(_values.end() - count),
-                                            std::make_move_iterator(_values.end()));
-        _values.resize(_values.size() - count);
-        return close(Record::make<std::vector<PropertyValue>>(false, std::move(elements)));
-    }
-    bool EndObject(rapidjson::SizeType count) {
-        Record::Entries entries;
-        entries.reserve(count);
-        size_t firstKey = _keys.size() - count, firstValue = _values.size() - count;
-        for (size_t i = 0; i < count; ++i) {
-            entries.emplace_back(std::move(_keys[firstKey + i]), std::move(_values[firstValue + i]));
-        }
-        _keys.resize(firstKey);
-        _values.resize(firstValue);
-        return close(Record::make<Record::Entries>(false, Record::normalized(std::move(entries))));
-    }
-
-    PropertyValue result() { return _values.size() == 1 ? std::move(_values.front()) : PropertyValue(); }
+    bool StartObject() { return open() && _handler.startObject(); }
+    bool StartArray() { return open() && _handler.startArray(); }
+    bool EndObject(rapidjson::SizeType count) { return close() && _handler.endObject(count); }
+    bool EndArray(rapidjson::SizeType count) { return close() && _handler.endArray(count); }
 
 private:
-    bool push(PropertyValue value) {
-        _values.push_back(std::move(value));
+    bool open() { return ++_depth <= PropertyValue::kMaxJSONDepth; }
+    bool close() {
+        --_depth;
         return true;
     }
-    bool open() { return ++_depth <= PropertyValue::kMaxJSONDepth; }
-    bool close(PropertyValue container) {
-        --_depth;
-        return push(std::move(container));
-    }
 
-    std::vector<PropertyValue> _values;
-    std::vector<std::string> _keys;
+    JSONEventHandler& _handler;
     size_t _depth = 0;
 };
 
@@ -134,16 +109,79 @@ std::unique_ptr<char[]> paddedCopy(std::string_view text) {
 
 }  // namespace
 
-PropertyValue PropertyValue::fromJSON(std::string_view text) {
+bool readJSON(std::string_view text, JSONEventHandler& handler) {
     constexpr unsigned kFlags = rapidjson::kParseNumbersAsStringsFlag | rapidjson::kParseIterativeFlag;
     const std::unique_ptr<char[]> buffer = paddedCopy(text);
     rapidjson::StringStream stream(buffer.get());
-    TreeBuilder builder;
+    EventForwarder forwarder(handler);
     rapidjson::Reader reader;
-    if (reader.Parse<kFlags>(stream, builder).IsError()) return {};
+    if (reader.Parse<kFlags>(stream, forwarder).IsError()) return false;
     // The stream ends at the NUL byte; one inside the text must not end the document early.
-    if (stream.Tell() != text.size()) return {};
-    return builder.result();
+    return stream.Tell() == text.size();
+}
+
+// Builds the tree bottom-up: finished values wait on one stack (keys on another) until their
+// container ends, and each container takes its children in one move.
+bool JSONValueBuilder::null() { return push(PropertyValue::null()); }
+bool JSONValueBuilder::boolean(bool value) { return push(PropertyValue::fromBool(value)); }
+
+bool JSONValueBuilder::number(std::string_view text) {
+    std::optional<PropertyValue> number = parseNumber(text);
+    return number && push(std::move(*number));
+}
+
+bool JSONValueBuilder::string(std::string_view text) { return push(Record::make<std::string>(false, text)); }
+
+bool JSONValueBuilder::key(std::string_view text) {
+    _keys.emplace_back(text);
+    return true;
+}
+
+bool JSONValueBuilder::startObject() {
+    ++_openContainers;
+    return true;
+}
+
+bool JSONValueBuilder::startArray() {
+    ++_openContainers;
+    return true;
+}
+
+bool JSONValueBuilder::endArray(size_t count) {
+    std::vector<PropertyValue> elements(std::make_move_iterator(_values.end() - static_cast<ptrdiff_t>(count)),
+                                        std::make_move_iterator(_values.end()));
+    _values.resize(_values.size() - count);
+    --_openContainers;
+    return push(Record::make<std::vector<PropertyValue>>(false, std::move(elements)));
+}
+
+bool JSONValueBuilder::endObject(size_t count) {
+    Record::Entries entries;
+    entries.reserve(count);
+    const size_t firstKey = _keys.size() - count, firstValue = _values.size() - count;
+    for (size_t i = 0; i < count; ++i) {
+        entries.emplace_back(std::move(_keys[firstKey + i]), std::move(_values[firstValue + i]));
+    }
+    _keys.resize(firstKey);
+    _values.resize(firstValue);
+    --_openContainers;
+    return push(Record::make<Record::Entries>(false, Record::normalized(std::move(entries))));
+}
+
+PropertyValue JSONValueBuilder::takeResult() {
+    PropertyValue result = _values.size() == 1 && isBetweenValues() ? std::move(_values.front()) : PropertyValue();
+    _values.clear();
+    return result;
+}
+
+bool JSONValueBuilder::push(PropertyValue value) {
+    _values.push_back(std::move(value));
+    return true;
+}
+
+PropertyValue PropertyValue::fromJSON(std::string_view text) {
+    JSONValueBuilder builder;
+    return readJSON(text, builder) ? builder.takeResult() : PropertyValue();
 }
 
 PropertyValue PropertyValue::fromJSON(const PropertyValue& data) {

@@ -1,3 +1,4 @@
+#include <charconv>
 #include <cstdint>
 #include <functional>
 #include <optional>
@@ -10,6 +11,7 @@
 #include <rapidjson/stringbuffer.h>
 #include <rapidjson/writer.h>
 
+#include "Host/JSONReader.h"
 #include "Host/JSONWriter.h"
 #include "Host/UTF8.h"
 #include "Shared/Recording/PipelineRecording.h"
@@ -179,6 +181,160 @@ Frame readFrame(const PropertyValue& object, std::vector<uint8_t>& scratch) {
     return frame;
 }
 
+// Reads a container of the current version straight from the JSON events into frames, with
+// no tree in between. It takes only the shape this writer produces (Version 2 first, then
+// Frames; each frame with exactly the members of its type, none twice, timestamps as plain
+// integers); on anything else it stops, and the caller reads the text the general way, which
+// accepts every form and names every error.
+class Version2Reader final : public JSONEventHandler {
+public:
+    explicit Version2Reader(PipelineRecording::FrameList& frames) : _frames(frames) {}
+
+    bool null() override { return takesValue() && feedValue(_value.null()); }
+    bool boolean(bool value) override { return takesValue() && feedValue(_value.boolean(value)); }
+    bool number(std::string_view text) override {
+        if (takesValue()) return feedValue(_value.number(text));
+        if (_state == State::Version) return text == "2" && enter(State::Root);
+        return _state == State::Timestamp && readTimestamp(text) && enter(State::InFrame);
+    }
+    bool string(std::string_view text) override {
+        if (takesValue()) return feedValue(_value.string(text));
+        switch (_state) {
+            case State::Type: return readType(text) && enter(State::InFrame);
+            case State::Key:
+                _frame.key = text;
+                return enter(State::InFrame);
+            case State::Data: return readData(text) && enter(State::InFrame);
+            default: return false;
+        }
+    }
+    bool key(std::string_view text) override {
+        if (takesValue()) return _value.key(text);
+        if (_state == State::Root) return readRootMember(text);
+        return _state == State::InFrame && readFrameMember(text);
+    }
+    bool startObject() override {
+        if (takesValue()) return _value.startObject();
+        if (_state == State::Start) return enter(State::Root);
+        if (_state != State::InFrames) return false;
+        _frame = Frame{};
+        _seen = 0;
+        return enter(State::InFrame);
+    }
+    bool startArray() override {
+        if (takesValue()) return _value.startArray();
+        return _state == State::Frames && enter(State::InFrames);
+    }
+    bool endObject(size_t count) override {
+        if (takesValue()) return feedValue(_value.endObject(count));
+        if (_state == State::Root) return _framesRead && enter(State::Done);
+        return _state == State::InFrame && finishFrame() && enter(State::InFrames);
+    }
+    bool endArray(size_t count) override {
+        if (takesValue()) return feedValue(_value.endArray(count));
+        return _state == State::InFrames && enter(State::Root);
+    }
+
+    bool finished() const noexcept { return _state == State::Done; }
+
+private:
+    enum class State { Start, Root, Version, Frames, InFrames, InFrame, Type, Timestamp, Key, Data, Value, InValue, Done };
+    enum MemberBit : uint8_t { kType = 1, kTimestamp = 2, kKey = 4, kData = 8, kValue = 16 };
+    struct Member {
+        std::string_view name;
+        uint8_t bit;
+        State state;
+    };
+    static constexpr Member kMembers[] = {
+        {"Type", kType, State::Type}, {"Timestamp", kTimestamp, State::Timestamp}, {"Key", kKey, State::Key},
+        {"Data", kData, State::Data}, {"Value", kValue, State::Value},
+    };
+
+    bool enter(State state) {
+        _state = state;
+        return true;
+    }
+    bool readRootMember(std::string_view name) {
+        if (name == "Version" && !_versionRead) {
+            _versionRead = true;
+            return enter(State::Version);
+        }
+        if (name != "Frames" || !_versionRead || _framesRead) return false;
+        _framesRead = true;
+        return enter(State::Frames);
+    }
+    bool readFrameMember(std::string_view name) {
+        for (const Member& member : kMembers) {
+            if (name != member.name) continue;
+            if (_seen & member.bit) return false;
+            _seen |= member.bit;
+            return enter(member.state);
+        }
+        return false;
+    }
+    // True while the events belong to a frame's value, which goes to the value builder.
+    bool takesValue() {
+        if (_state == State::Value) _state = State::InValue;
+        return _state == State::InValue;
+    }
+    // The value is complete once none of its containers is open any more.
+    bool feedValue(bool accepted) {
+        if (accepted && _value.isBetweenValues()) {
+            _frame.value = _value.takeResult();
+            _state = State::InFrame;
+        }
+        return accepted;
+    }
+    bool readType(std::string_view text) {
+        for (const Frame::Type type : {Frame::Type::State, Frame::Type::InputReport, Frame::Type::Metadata}) {
+            if (text != typeName(type)) continue;
+            _frame.type = type;
+            return true;
+        }
+        return false;
+    }
+    bool readTimestamp(std::string_view text) {
+        const auto result = std::from_chars(text.data(), text.data() + text.size(), _frame.timestamp);
+        return result.ec == std::errc() && result.ptr == text.data() + text.size();
+    }
+    // Bad hex text stops this reader (the frame may not even be a report); the general way
+    // then tells whether it is an error.
+    bool readData(std::string_view text) {
+        _scratch.clear();
+        try {
+            Util::appendBytesFromHexText(text, _scratch);
+        } catch (const std::invalid_argument&) {
+            return false;
+        }
+        _frame.data = ReportBytes(_scratch);
+        return true;
+    }
+    bool finishFrame() {
+        const uint8_t expected = _frame.type == Frame::Type::InputReport ? kType | kTimestamp | kData
+                                                                         : kType | kTimestamp | kKey | (_seen & kValue);
+        if (!(_seen & kType) || _seen != expected) return false;
+        _frames.push_back(std::move(_frame));
+        return true;
+    }
+
+    PipelineRecording::FrameList& _frames;
+    State _state = State::Start;
+    bool _versionRead = false;
+    bool _framesRead = false;
+    Frame _frame;
+    uint8_t _seen = 0;
+    JSONValueBuilder _value;
+    std::vector<uint8_t> _scratch;
+};
+
+// The JSON text inside a data or string value.
+std::optional<std::string_view> textOf(const PropertyValue& value) {
+    if (value.isString()) return value.stringView();
+    if (!value.isData()) return std::nullopt;
+    const std::span<const uint8_t> bytes = value.bytes();
+    return std::string_view(reinterpret_cast<const char*>(bytes.data()), bytes.size());
+}
+
 }  // namespace
 
 PropertyValue PipelineRecording::json() {
@@ -238,6 +394,11 @@ PropertyValue PipelineRecording::migrateSerializedContainer(const PropertyValue&
 
 PipelineRecording::PipelineRecording(const PropertyValue& data) {
     if (!data) throw std::invalid_argument("json not supplied");
+    if (const std::optional<std::string_view> text = textOf(data)) {
+        Version2Reader reader(_frames);
+        if (readJSON(*text, reader) && reader.finished()) return;
+        _frames.clear();
+    }
     PropertyValue container;
     try {
         container = migrateSerializedContainer(PropertyValue::fromJSON(data));
