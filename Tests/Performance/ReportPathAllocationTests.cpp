@@ -1,6 +1,7 @@
 // The input report thread is real-time: once warmed up, a report that produces no event must
 // reach the recording, the pipeline and the touch algorithm without a single heap allocation.
 #include <cstdlib>
+#include <functional>
 #include <memory>
 #include <new>
 #include <string>
@@ -20,43 +21,27 @@
 #define ZELTO_COUNT_ALLOCATIONS 1
 #endif
 
-namespace {
+static thread_local long tAllocations = 0;
 
-thread_local long tAllocations = 0;
-
-[[maybe_unused]] void* countedAllocation(std::size_t size) {
+// Every replacement stays out of line: once inlined next to each other, malloc and free draw
+// false mismatched-allocation warnings. The array forms need no replacement: the standard
+// library's own forward to these.
+#if ZELTO_COUNT_ALLOCATIONS
+[[gnu::noinline]] void* operator new(std::size_t size) {
     ++tAllocations;
     if (void* block = std::malloc(size ? size : 1)) return block;
     throw std::bad_alloc();
 }
-[[maybe_unused]] void* countedAlignedAllocation(std::size_t size, std::align_val_t alignment) {
+[[gnu::noinline]] void* operator new(std::size_t size, std::align_val_t alignment) {
     ++tAllocations;
     const auto align = static_cast<std::size_t>(alignment);
     if (void* block = std::aligned_alloc(align, (size + align - 1) / align * align)) return block;
     throw std::bad_alloc();
 }
-
-}  // namespace
-
-// Every replacement stays out of line: once inlined next to each other, malloc and free draw
-// false mismatched-allocation warnings.
-#if ZELTO_COUNT_ALLOCATIONS
-[[gnu::noinline]] void* operator new(std::size_t size) { return countedAllocation(size); }
-[[gnu::noinline]] void* operator new[](std::size_t size) { return countedAllocation(size); }
-[[gnu::noinline]] void* operator new(std::size_t size, std::align_val_t alignment) {
-    return countedAlignedAllocation(size, alignment);
-}
-[[gnu::noinline]] void* operator new[](std::size_t size, std::align_val_t alignment) {
-    return countedAlignedAllocation(size, alignment);
-}
 [[gnu::noinline]] void operator delete(void* block) noexcept { std::free(block); }
-[[gnu::noinline]] void operator delete[](void* block) noexcept { std::free(block); }
 [[gnu::noinline]] void operator delete(void* block, std::size_t) noexcept { std::free(block); }
-[[gnu::noinline]] void operator delete[](void* block, std::size_t) noexcept { std::free(block); }
 [[gnu::noinline]] void operator delete(void* block, std::align_val_t) noexcept { std::free(block); }
-[[gnu::noinline]] void operator delete[](void* block, std::align_val_t) noexcept { std::free(block); }
 [[gnu::noinline]] void operator delete(void* block, std::size_t, std::align_val_t) noexcept { std::free(block); }
-[[gnu::noinline]] void operator delete[](void* block, std::size_t, std::align_val_t) noexcept { std::free(block); }
 #endif
 
 namespace ZeltoTouch {
@@ -77,59 +62,44 @@ brush play-pause 400ms
 palm 500ms
 )";
 
-std::vector<Platform::SimulatedReport> sessionReports(int cycles) {
-    std::string text;
-    for (int i = 0; i < cycles; ++i) text += kSessionCycle;
-    return Platform::SensorReportGenerator(Platform::GestureScriptParser::parse(text)).generateAll();
-}
-
-// The service's arrangement: the recording in front of the pipeline, and a probe that sees
-// which reports produce events.
-struct ReportPath {
-    std::shared_ptr<Pipeline> pipeline = std::make_shared<Pipeline>();
-    PipelineRecording recording;
-    bool producedEvents = false;
-
-    ReportPath() {
-        recording.setMaxFrameCount(kServiceFrameLimit);
-        recording.pipeline = pipeline;
-        pipeline->hidEventsProbe = std::make_shared<std::function<void(uint64_t, const HIDEventList&)>>(
-            [this](uint64_t, const HIDEventList&) { producedEvents = true; });
-    }
-};
-
 TEST(ReportPathAllocations, NoneForReportsWithoutEventsOnceWarm) {
     if (!ZELTO_COUNT_ALLOCATIONS) GTEST_SKIP() << "allocations are not counted under AddressSanitizer";
-    const std::vector<Platform::SimulatedReport> reports = sessionReports(40);
-    ReportPath path;
+    std::string script;
+    for (int i = 0; i < 40; ++i) script += kSessionCycle;
+    const auto reports = Platform::SensorReportGenerator(Platform::GestureScriptParser::parse(script)).generateAll();
+
+    // The service's arrangement: the recording in front of the pipeline, and a probe that sees
+    // which reports produce events.
+    auto pipeline = std::make_shared<Pipeline>();
+    bool producedEvents = false;
+    pipeline->hidEventsProbe = std::make_shared<std::function<void(uint64_t, const HIDEventList&)>>(
+        [&producedEvents](uint64_t, const HIDEventList&) { producedEvents = true; });
+    PipelineRecording recording;
+    recording.setMaxFrameCount(kServiceFrameLimit);
+    recording.pipeline = pipeline;
+
     // Warm-up: the list grows to twice the limit and is trimmed once, so every pool and buffer
     // on the path has reached its working size.
     const size_t warmUp = 2 * kServiceFrameLimit + 500;
     ASSERT_GT(reports.size(), warmUp + 3000);
-
     size_t measured = 0, eventless = 0;
-    long allocationsInEventlessReports = 0;
     for (size_t i = 0; i < reports.size(); ++i) {
         const std::vector<uint8_t>& bytes = reports[i].bytes;
-        const uint64_t time = uint64_t{reports[i].scriptTimeMs} * 1000000;
-        path.producedEvents = false;
+        producedEvents = false;
         const long before = tAllocations;
-        path.recording.handleInputReport(time, bytes.data(), bytes.size());
+        recording.handleInputReport(uint64_t{reports[i].scriptTimeMs} * 1000000, bytes.data(), bytes.size());
         const long allocations = tAllocations - before;
         if (i < warmUp) continue;
         ++measured;
-        if (path.producedEvents) continue;
+        if (producedEvents) continue;
         ++eventless;
-        allocationsInEventlessReports += allocations;
-        EXPECT_EQ(allocations, 0) << "report " << i;
-        if (allocations) break;  // one report tells the story
+        ASSERT_EQ(allocations, 0) << "report " << i;  // one report tells the story
     }
     EXPECT_GT(tAllocations, 0);  // the counter sees this thread's allocations
     EXPECT_GT(eventless, 3000u);
     EXPECT_LT(eventless, measured);  // the session did produce events along the way
-    EXPECT_EQ(allocationsInEventlessReports, 0);
     // The measured stretch spans trims: the list never holds more than twice the limit.
-    EXPECT_LE(path.recording.frames().size(), 2 * kServiceFrameLimit);
+    EXPECT_LE(recording.frames().size(), 2 * kServiceFrameLimit);
 }
 
 }  // namespace

@@ -1,116 +1,85 @@
-#include <gtest/gtest.h>
-
 #include <string>
+#include <tuple>
 #include <vector>
+
+#include <gtest/gtest.h>
 
 #include "Shared/Algs/Algs.h"
 
 namespace ZeltoTouch {
 namespace {
 
+using PV = PropertyValue;
+const std::string kFactor = "VirtualNormalizationFactors.";
+
 TEST(AlgsStateTest, DefaultsAndTheirTypes) {
+    using K = PV::NumberKind;
     const Algs algs;
-    struct Case {
-        const char* key;
-        PropertyValue::NumberKind kind;
-        double value;
+    const std::tuple<const char*, K, double> cases[] = {
+        {"EnableHoldSuppression", K::Boolean, 1}, {"EnableTapSuppression", K::Boolean, 1},
+        {"HoldTimeoutMilliseconds", K::UInt32, 500}, {"ActivationThreshold", K::Float32, 200},
     };
-    const Case cases[] = {
-        {"EnableHoldSuppression", PropertyValue::NumberKind::Boolean, 1},
-        {"EnableTapSuppression", PropertyValue::NumberKind::Boolean, 1},
-        {"HoldTimeoutMilliseconds", PropertyValue::NumberKind::UInt32, 500},
-        {"ActivationThreshold", PropertyValue::NumberKind::Float32, 200},
-    };
-    for (const Case& c : cases) {
-        const PropertyValue value = algs.getState(c.key);
-        ASSERT_TRUE(value.isNumber()) << c.key;
-        EXPECT_EQ(value.numberKind(), c.kind) << c.key;
-        EXPECT_EQ(value.toDouble(), c.value) << c.key;
+    for (const auto& [key, kind, value] : cases) {
+        EXPECT_EQ(algs.getState(key).numberKind(), kind) << key;
+        EXPECT_EQ(algs.getState(key).toDouble(), value) << key;
     }
 }
 
-TEST(AlgsStateTest, WritesCoerceValues) {
-    struct Case {
-        const char* key;
-        PropertyValue written;
-        double readBack;
+TEST(AlgsStateTest, WritesCoerceValuesToTheKeysType) {
+    const std::tuple<std::string, PV, double> cases[] = {
+        {"HoldTimeoutMilliseconds", PV::fromUInt64(4294967296ull + 250), 250},
+        {"HoldTimeoutMilliseconds", PV::string("750"), 0}, {"HoldTimeoutMilliseconds", PV(), 0},
+        {"EnableTapSuppression", PV::fromInt32(0), 0},
+        {"EnableHoldSuppression", PV::mutableDictionary(), 0}, {"EnableHoldSuppression", PV::fromInt32(7), 1},
+        {"ActivationThreshold", PV::fromDouble(123.5), 123.5},  {"ActivationThreshold", PV::null(), 0},
+        {kFactor + "5", PV::fromDouble(2.5), 2.5}, {kFactor + "5", PV::string("2.5"), 0},
     };
-    const Case cases[] = {
-        {"HoldTimeoutMilliseconds", PropertyValue::fromUInt64(4294967296ull + 250), 250},
-        {"HoldTimeoutMilliseconds", PropertyValue::string("750"), 0},
-        {"HoldTimeoutMilliseconds", PropertyValue(), 0},
-        {"EnableTapSuppression", PropertyValue::fromInt32(0), 0},
-        {"EnableHoldSuppression", PropertyValue::mutableDictionary(), 0},
-        {"EnableHoldSuppression", PropertyValue::fromInt32(7), 1},
-        {"ActivationThreshold", PropertyValue::fromDouble(123.5), 123.5},
-        {"ActivationThreshold", PropertyValue::null(), 0},
-        {"VirtualNormalizationFactors.5", PropertyValue::fromDouble(2.5), 2.5},
-        {"VirtualNormalizationFactors.5", PropertyValue::string("2.5"), 0},
-    };
-    for (const Case& c : cases) {
+    for (const auto& [key, written, readBack] : cases) {
         Algs algs;
-        algs.setState(c.key, c.written);
-        EXPECT_EQ(algs.getState(c.key).toDouble(), c.readBack) << c.key << " <- " << c.written.description();
+        algs.setState(key, written);
+        EXPECT_EQ(algs.getState(key).toDouble(), readBack) << key << " <- " << written.description();
+        EXPECT_EQ(algs.getState(key).numberKind(), Algs().getState(key).numberKind()) << key;
     }
-    Algs algs;
-    algs.setState("EnableTapSuppression", PropertyValue::fromInt32(0));
-    EXPECT_EQ(algs.getState("EnableTapSuppression").numberKind(), PropertyValue::NumberKind::Boolean);
 }
 
 TEST(AlgsStateTest, FactorIndexIsReadLikeAStreamExtractsAnUnsignedNumber) {
-    const Algs algs;
-    const PropertyValue first = algs.getState("VirtualNormalizationFactors.0");
-    ASSERT_TRUE(first.isNumber());
-    EXPECT_EQ(first.toFloat(), 0.6667f);
-    struct Case {
-        const char* rest;
-        int entry;  // -1: no value
-    };
-    const Case cases[] = {
-        {"22", 22}, {"23", -1}, {"-1", -1}, {"x", 0}, {"", 0}, {"3abc", 3}, {" \t7", 7}, {"+7", 7},
-        {"007", 7}, {"-0", 0}, {"- 1", 0}, {"7.9", 7}, {"18446744073709551616", -1}, {"99999999999999999999999", -1},
+    Algs algs;
+    EXPECT_EQ(algs.getState(kFactor + "0").toFloat(), 0.6667f);
+    EXPECT_EQ(algs.getState(kFactor + "7").toFloat(), 0.4651f);
+    for (int i = 0; i < kVirtualPixelCount; ++i) algs.setState(kFactor + std::to_string(i), PV::fromInt32(i));
+    // Writes out of range change nothing.
+    for (const char* rest : {"23", "-1", "18446744073709551616"}) algs.setState(kFactor + rest, PV::fromInt32(99));
+    algs.setState("VirtualNormalizationFactors", PV::fromInt32(99));
+    const std::pair<const char*, int> cases[] = {  // entry -1: no value
+        {"22", 22}, {"23", -1}, {"-1", -1}, {"x", 0}, {"", 0}, {"3abc", 3}, {" \t7", 7}, {"+7", 7}, {"007", 7},
+        {"-0", 0}, {"- 1", 0}, {"7.9", 7}, {"18446744073709551616", -1}, {"99999999999999999999999", -1},
         {"VirtualNormalizationFactors.1", 0},  // only one level of domain is stripped
     };
-    const std::vector<float> factors = {0.6667f, 0.4444f, 0.6667f, 0.5714f, 0.6667f, 0.5714f, 0.6667f, 0.4651f,
-                                        0.6667f, 0.6667f, 0.4f,    0.4f,    0.4f,    0.4f,    0.4f,    0.5714f,
-                                        0.4f,    0.4f,    0.4f,    0.4f,    0.4444f, 0.5714f, 0.6667f};
-    for (const Case& c : cases) {
-        const PropertyValue value = algs.getState(std::string("VirtualNormalizationFactors.") + c.rest);
-        if (c.entry < 0) {
-            EXPECT_FALSE(value) << '"' << c.rest << '"';
-        } else {
-            EXPECT_EQ(value.toFloat(), factors[c.entry]) << '"' << c.rest << '"';
-        }
+    for (const auto& [rest, entry] : cases) {
+        const PV value = algs.getState(kFactor + rest);
+        EXPECT_EQ(value ? value.toFloat() : -1.0f, static_cast<float>(entry)) << '"' << rest << '"';
+    }
+    for (int i = 0; i < kVirtualPixelCount; ++i) {
+        EXPECT_EQ(algs.getState(kFactor + std::to_string(i)).toFloat(), static_cast<float>(i));
     }
     EXPECT_FALSE(algs.getState("VirtualNormalizationFactors"));
     EXPECT_FALSE(algs.getState("VirtualNormalizationFactorsX0"));
 }
 
-TEST(AlgsStateTest, FactorWritesOutOfRangeChangeNothing) {
-    Algs algs;
-    algs.setState("VirtualNormalizationFactors.23", PropertyValue::fromDouble(9));
-    algs.setState("VirtualNormalizationFactors.-1", PropertyValue::fromDouble(9));
-    algs.setState("VirtualNormalizationFactors", PropertyValue::fromDouble(9));
-    for (int i = 0; i < kVirtualPixelCount; ++i) {
-        EXPECT_NE(algs.getState("VirtualNormalizationFactors." + std::to_string(i)).toFloat(), 9.0f) << i;
-    }
-}
-
-TEST(AlgsStateTest, FactorWritesDoNotReachRunningAlgorithm) {
+TEST(AlgsStateTest, FactorWritesDoNotReachTheRunningAlgorithm) {
     Algs changed;
     Algs reference;
-    changed.setState("VirtualNormalizationFactors.0", PropertyValue::fromDouble(2.5));
+    changed.setState(kFactor + "0", PV::fromDouble(2.5));
     InputReport::Image image;
     image.signedPixels[0] = 300;
     changed.handleImage(image);
     reference.handleImage(image);
     EXPECT_EQ(changed.virtualPixels()[0].value, reference.virtualPixels()[0].value);
-    EXPECT_EQ(changed.getState("VirtualNormalizationFactors.0").toFloat(), 2.5f);
 }
 
 TEST(AlgsStateTest, ActivationThresholdAppliesFromNextFrame) {
     Algs algs;
-    algs.setState("ActivationThreshold", PropertyValue::fromFloat(1000));
+    algs.setState("ActivationThreshold", PV::fromFloat(1000));
     InputReport::Image image;
     image.signedPixels[0] = 300;  // 576, no longer above the threshold
     EXPECT_TRUE(algs.handleImage(image).empty());
@@ -122,9 +91,7 @@ TEST(AlgsStateTest, UnknownAndReadOnlyKeys) {
     for (const char* key : {"Unknown", "activationThreshold", "Algs.ActivationThreshold", "ResetEventStats", ""}) {
         EXPECT_FALSE(algs.getState(key)) << key;
     }
-    algs.setState("EventStats", PropertyValue::fromInt32(1));
-    algs.setState("DebugInfo", PropertyValue::fromInt32(1));
-    algs.setState("Unknown", PropertyValue::fromInt32(1));
+    for (const char* key : {"EventStats", "DebugInfo", "Unknown"}) algs.setState(key, PV::fromInt32(1));
     const PropertyValue debugInfo = algs.getState("DebugInfo");
     EXPECT_EQ(debugInfo.keys(), std::vector<std::string>{"EventStats"});
     EXPECT_EQ(debugInfo.get("EventStats"), algs.getState("EventStats"));

@@ -1,36 +1,25 @@
-#include <gtest/gtest.h>
+#include "Shared/Algs/HandStats.h"
 
+#include <array>
 #include <cmath>
+#include <tuple>
 #include <vector>
 
-#include "Shared/Algs/HandStats.h"
+#include <gtest/gtest.h>
+
+#include "Tests/Shared/Algs/Channels.h"
 
 namespace ZeltoTouch {
 namespace {
 
-// Channels whose flags a test sets by hand. Their values stay 0, so the classifier does not
-// evaluate and the touch score changes only where a test changes it.
-struct Channels {
-    Channels() {
-        for (int i = 0; i < kPixelCount; ++i) pixels.emplace_back(i, 1.0f);
-        for (int i = 0; i < kVirtualPixelCount; ++i) virtualPixels.emplace_back("A", 1.0f);
-        for (VirtualPixel& pixel : virtualPixels) pixel.index = 0;
-    }
-    // Pixel A touched (or not) at a normalised value, above noise while touched.
-    void touchA(bool touched, float normalizedValue = 2.0f) {
-        pixels[0].active = touched;
-        pixels[0].aboveNoise = touched;
-        pixels[0].normalizedValue = touched ? normalizedValue : 0.0f;
-    }
-
-    std::vector<Pixel> pixels;
-    std::vector<VirtualPixel> virtualPixels;
-};
-
+// Channel A's values stay 0 unless touched, so the classifier does not evaluate and the touch
+// score changes only where a test changes it.
 class HandStatsFrames : public testing::Test {
 protected:
-    void frame(uint32_t timeMs, bool touched, float strength = 2.0f) {
-        channels.touchA(touched, strength);
+    // A frame with pixel A touched (above noise at a normalised value) or not.
+    void frame(uint32_t timeMs, bool touched, float normalizedValue = 2.0f) {
+        channels.pixels[0].active = channels.pixels[0].aboveNoise = touched;
+        channels.pixels[0].normalizedValue = touched ? normalizedValue : 0.0f;
         hand.updateHandState(channels.pixels, channels.virtualPixels, timeMs);
     }
 
@@ -38,41 +27,28 @@ protected:
     Channels channels;
 };
 
-TEST_F(HandStatsFrames, ResetClearsScoresOnly) {
-    frame(1000, true);
-    hand.touchScore = 5;
-    hand.Reset();
-    EXPECT_EQ(hand.touchScore, 0.0f);
-    EXPECT_EQ(hand.peakActiveValue, 0.0f);
-    EXPECT_TRUE(hand.touching);
-    EXPECT_EQ(hand.touchStartMs, 1000u);
-    EXPECT_EQ(hand.activeRegion, PixelRegion::PlayPause);
-
-    hand.decayBase = 3;
-    hand.SetDecayParameters();
-    EXPECT_EQ(hand.decayBase, 7.389056f);
+// A finished touch with a peak of 2, for the tap features.
+HandStats finishedTouch(uint32_t startMs, uint32_t endMs, uint32_t aboveNoiseStartMs, uint32_t lastGestureMs) {
+    HandStats hand;
+    hand.touchStartMs = startMs;
+    hand.touchEndMs = endMs;
+    hand.aboveNoiseStartMs = aboveNoiseStartMs;
+    hand.lastGestureMs = lastGestureMs;
+    hand.peakActiveValue = 2.0f;
+    return hand;
 }
 
-struct DecayCase {
-    float score;
-    uint32_t sinceEndMs;
-    float expected;
-};
-
 TEST(HandStatsTest, DecayDependsOnGapSinceLastAboveNoisePeriod) {
-    const DecayCase cases[] = {
-        {10.0f, 1, 8.435f},      // d = 0
-        {10.0f, 2, 5.745f},      // d = 1
-        {-10.0f, 2, -5.745f},    // the sign stays
-        {10.0f, 3, 0.0f},        // d = 2 and later: gone
-        {10.0f, 0, 0.0f},        // an end at this very frame wraps d to 2^32 - 1
+    const std::tuple<float, uint32_t, float> cases[] = {  // score, ms since the period ended, decayed score
+        {10.0f, 1, 8.435f}, {10.0f, 2, 5.745f}, {-10.0f, 2, -5.745f}, {10.0f, 3, 0.0f},
+        {10.0f, 0, 0.0f},  // an end at this very frame wraps the gap to 2^32 - 1
     };
-    for (const DecayCase& c : cases) {
+    for (const auto& [score, sinceEndMs, expected] : cases) {
         HandStats hand;
-        hand.touchScore = c.score;
+        hand.touchScore = score;
         hand.aboveNoiseEndMs = 0xFFFFFFFFu;  // the gap wraps around 2^32 too
-        hand.decayTouchScore(0xFFFFFFFFu + c.sinceEndMs);
-        EXPECT_NEAR(hand.touchScore, c.expected, 0.001f) << c.score << " after " << c.sinceEndMs << " ms";
+        hand.decayTouchScore(0xFFFFFFFFu + sinceEndMs);
+        EXPECT_NEAR(hand.touchScore, expected, 0.001f) << score << " after " << sinceEndMs << " ms";
     }
     HandStats negativeZero;
     negativeZero.touchScore = -0.0f;
@@ -80,93 +56,54 @@ TEST(HandStatsTest, DecayDependsOnGapSinceLastAboveNoisePeriod) {
     EXPECT_TRUE(std::signbit(negativeZero.touchScore));
 }
 
-TEST_F(HandStatsFrames, TouchScoreIsClampedToLimit) {
+TEST_F(HandStatsFrames, TouchScoreIsClampedAndDecaysWhenAboveNoisePeriodStarts) {
     for (const float start : {100.5f, -100.5f, 99.5f}) {
         hand.touchScore = start;
         frame(1000, false);  // a frame the classifier does not evaluate adds 0
         EXPECT_EQ(hand.touchScore, std::fmin(std::fmax(start, -100.0f), 100.0f));
     }
-}
-
-TEST_F(HandStatsFrames, DecayAppliesWhenAboveNoisePeriodStarts) {
-    frame(1000, true);
-    frame(1010, false);  // above-noise period ends at 1010
+    frame(1010, true);
+    frame(1020, false);  // above-noise period ends at 1020
     hand.touchScore = 10;
-    frame(1012, true);   // new period 2 ms later: d = 1
+    frame(1022, true);  // new period 2 ms later
     EXPECT_NEAR(hand.touchScore, 5.745f, 0.001f);
 }
 
 TEST(HandStatsTest, TapFeaturesOfAnAcceptedTap) {
-    HandStats hand;
-    hand.touchStartMs = 1000;
-    hand.touchEndMs = 1100;
-    hand.aboveNoiseStartMs = 990;
-    hand.lastGestureMs = 0;
-    hand.peakActiveValue = 2.0f;
+    HandStats hand = finishedTouch(1000, 1100, 990, 0);
     const Channels channels;
     hand.updateTapRejection(channels.pixels, channels.virtualPixels);
     EXPECT_EQ(hand.peakAmplitude, 400.0f);
     EXPECT_NEAR(hand.sd, 3.126f, 0.001f);
     EXPECT_NEAR(hand.tsd, 3.35f, 0.0001f);
     EXPECT_NEAR(hand.timeDurationRatio, 0.659f, 0.001f);
-    EXPECT_EQ(hand.nonActivePixels, 21);
     EXPECT_NEAR(hand.tapSVMScore, 4.21f, 0.01f);
-    EXPECT_FALSE(hand.tapRejected);
+
+    HandStats afterGesture = finishedTouch(1000, 1100, 500, 1070);  // a recent gesture limits the time
+    afterGesture.updateTapRejection(channels.pixels, channels.virtualPixels);
+    EXPECT_NEAR(afterGesture.sd, 400.0f / 30.0f - 0.51f, 1e-5f);
 }
 
 TEST(HandStatsTest, TapRejectionRules) {
-    struct Case {
+    const struct {
         const char* name;
         uint32_t touchStartMs, touchEndMs, aboveNoiseStartMs, lastGestureMs;
         int silentChannels;  // above noise without ever becoming active
         bool rejected;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"accepted", 1000, 1100, 990, 0, 0, false},
         {"zero touch time gives tsd 0", 1100, 1100, 990, 0, 0, true},
         {"twenty-two silent channels", 1000, 1100, 990, 0, 22, true},
         {"twenty-one silent channels", 1000, 1100, 990, 0, 21, false},
         {"times wrapping around 2^32", 0xFFFFFFD0u, 0x34u, 0xFFFFFFC6u, 0x80000000u, 0, false},
     };
-    for (const Case& c : cases) {
-        HandStats hand;
-        hand.touchStartMs = c.touchStartMs;
-        hand.touchEndMs = c.touchEndMs;
-        hand.aboveNoiseStartMs = c.aboveNoiseStartMs;
-        hand.lastGestureMs = c.lastGestureMs;
-        hand.peakActiveValue = 2.0f;
+    for (const auto& c : cases) {
+        HandStats hand = finishedTouch(c.touchStartMs, c.touchEndMs, c.aboveNoiseStartMs, c.lastGestureMs);
         Channels channels;
-        for (int i = 0; i < c.silentChannels; ++i) {
-            Pixel& pixel = i < kPixelCount ? channels.pixels[i] : channels.virtualPixels[i - kPixelCount];
-            pixel.everAboveNoise = true;
-        }
+        for (int i = 0; i < c.silentChannels; ++i) channels[i].everAboveNoise = true;
         hand.updateTapRejection(channels.pixels, channels.virtualPixels);
         EXPECT_EQ(hand.tapRejected, c.rejected) << c.name;
         EXPECT_EQ(hand.nonActivePixels, 21 - c.silentChannels) << c.name;
-    }
-}
-
-TEST(HandStatsTest, RecentGestureLimitsAboveNoiseTime) {
-    HandStats hand;
-    hand.touchStartMs = 1000;
-    hand.touchEndMs = 1100;
-    hand.aboveNoiseStartMs = 500;
-    hand.lastGestureMs = 1070;
-    hand.peakActiveValue = 2.0f;
-    const Channels channels;
-    hand.updateTapRejection(channels.pixels, channels.virtualPixels);
-    EXPECT_NEAR(hand.sd, 400.0f / 30.0f - 0.51f, 1e-5f);
-}
-
-TEST_F(HandStatsFrames, HoldStartsStrictlyAfterHoldTime) {
-    for (const bool suppression : {false, true}) {
-        hand = HandStats();
-        hand.enableHoldSuppression = suppression;
-        for (uint32_t t = 1000; t <= 1500; t += 10) frame(t, true);
-        EXPECT_FALSE(hand.holding);
-        frame(1501, true);
-        EXPECT_TRUE(hand.holding) << "suppression " << suppression;
-        EXPECT_FALSE(hand.holdSuppressed);
     }
 }
 
@@ -201,40 +138,107 @@ TEST_F(HandStatsFrames, SuppressedHoldTurnsIntoHoldWhenScoreRecovers) {
 TEST_F(HandStatsFrames, RejectedTapVerdictLastsOneFrameWithSuppression) {
     frame(1000, true, 0.5f);  // too weak: tsd < 0
     frame(1400, false);
-    EXPECT_TRUE(hand.tapCandidate);
+    EXPECT_TRUE(hand.tapCandidate && hand.tapRejected);
     EXPECT_FALSE(hand.tap);
-    EXPECT_TRUE(hand.tapRejected);
     frame(1410, false);
-    EXPECT_FALSE(hand.tapRejected);
-    EXPECT_FALSE(hand.tapCandidate);
+    EXPECT_FALSE(hand.tapRejected || hand.tapCandidate);
 }
 
-TEST_F(HandStatsFrames, TapDecision) {
-    struct Case {
-        bool holdSuppression, tapSuppression;
-        float strength;  // normalised value while touched
-        uint32_t lengthMs;
-        bool tapCandidate, tap;
-    };
-    const Case cases[] = {
-        {true, true, 2.0f, 400, true, true},
-        {true, true, 0.0f, 400, true, false},   // rejected: no amplitude
-        {true, false, 0.0f, 400, true, true},   // rejected, but suppression off
-        {true, true, 2.0f, 600, false, false},  // past the hold time
-        {false, true, 5.0f, 600, true, true},   // hold time not tracked without hold suppression
-    };
-    for (const Case& c : cases) {
-        hand = HandStats();
-        hand.enableHoldSuppression = c.holdSuppression;
-        hand.enableTapSuppression = c.tapSuppression;
-        for (uint32_t t = 1000; t < 1000 + c.lengthMs; t += 10) frame(t, true, c.strength);
-        frame(1000 + c.lengthMs, false);
-        EXPECT_EQ(hand.tapCandidate, c.tapCandidate) << c.lengthMs << " ms at " << c.strength;
-        EXPECT_EQ(hand.tap, c.tap) << c.lengthMs << " ms at " << c.strength;
-        if (c.tap) {
-            EXPECT_EQ(hand.lastGestureMs, 1000 + c.lengthMs);
-        }
+// Region tracking: which region a touch belongs to, and when a hold moves to another.
+constexpr int A = 0, B = 1, G = 6, H = 7, I = 8, K = 10, L = 11, M = 12;
+constexpr PixelRegion P = PixelRegion::PlayPause, D = PixelRegion::VolumeDown, U = PixelRegion::VolumeUp;
+
+TEST(RegionTrackingTest, TimeBiasFactorFadesFromLastGestureAndInterpolationClips) {
+    const std::pair<uint32_t, float> cases[] = {{0, 0.65f}, {300, 0.65f}, {650, 0.825f}, {1000, 1.0f}, {60000, 1.0f}};
+    for (const auto& [sinceGestureMs, factor] : cases) {
+        HandStats hand;
+        hand.lastGestureMs = 0xFFFFFF00u;  // the difference wraps around 2^32
+        EXPECT_NEAR(hand.updateTimeBiasFactor(0xFFFFFF00u + sinceGestureMs), factor, 1e-6f) << sinceGestureMs;
     }
+    EXPECT_FLOAT_EQ(HandStats::fuzzify(2.0f, 0.0f, 1.0f, 0.0f, 10.0f), 20.0f);  // not clipped
+    EXPECT_EQ(HandStats::fuzzifyAndClip(0.1f, 0.2f, 0.5f, 1.3f, 5.0f), 1.3f);
+    EXPECT_EQ(HandStats::fuzzifyAndClip(0.9f, 0.2f, 0.5f, 1.3f, 5.0f), 5.0f);
+}
+
+struct BiasCase {
+    const char* name;
+    int peakChannel;
+    std::vector<std::pair<int, float>> maxAboveNoise;  // physical channels
+    PixelRegion lastGestureRegion;
+    uint32_t sinceGestureMs;
+    float klm, ijk;  // virtual pixels' maxAboveNoise
+    PixelRegion expected;
+};
+
+TEST(RegionTrackingTest, ActiveRegionFollowsTheLastGestureAndChannelK) {
+    const BiasCase cases[] = {
+        {"runner-up in the last gesture's region wins", H, {{H, 2.0f}, {L, 1.5f}}, D, 200, 0, 0, D},
+        {"runner-up too weak", H, {{H, 2.0f}, {L, 1.2f}}, D, 200, 0, 0, U},
+        {"bias faded after one second", H, {{H, 2.0f}, {L, 1.9f}}, D, 1000, 0, 0, U},
+        {"runner-up below noise", H, {{H, 0.5f}, {L, 0.375f}}, D, 200, 0, 0, U},
+        {"a tie keeps the lower channel first", H, {{H, 2.0f}, {L, 2.0f}}, D, 200, 0, 0, D},
+        {"K towards volume down", K, {{K, 2.0f}, {M, 1.0f}}, P, 2000, 1.5f, 0, D},
+        {"K combination too weak", K, {{K, 2.0f}, {M, 1.0f}}, P, 2000, 1.4f, 0, P},
+        {"K share follows the bias after a volume-down gesture", K, {{K, 2.0f}, {M, 1.0f}}, D, 200, 1.35f, 0, D},
+        {"K share fixed after another gesture", K, {{K, 2.0f}, {M, 1.0f}}, P, 200, 1.35f, 0, P},
+        {"K towards volume up", K, {{K, 2.0f}, {I, 1.0f}}, P, 2000, 0, 1.5f, U},
+        {"the K rule needs K first", K, {{M, 2.0f}, {K, 1.0f}}, P, 2000, 5.0f, 0, P},
+        {"all equal keeps the peak's region", G, {}, P, 200, 0, 0, U},
+    };
+    for (const BiasCase& c : cases) {
+        Channels channels;
+        HandStats hand;
+        hand.peakActiveIndex = c.peakChannel;
+        for (const auto& [channel, value] : c.maxAboveNoise) channels[channel].maxAboveNoise = value;
+        hand.lastGestureRegion = c.lastGestureRegion;
+        hand.lastGestureMs = 5000;
+        channels.virtualPixels[19].maxAboveNoise = c.klm;
+        channels.virtualPixels[18].maxAboveNoise = c.ijk;
+        EXPECT_EQ(hand.updateActiveRegion(channels.pixels, channels.virtualPixels, 5000 + c.sinceGestureMs), c.expected)
+            << c.name;
+    }
+}
+
+TEST(RegionTrackingTest, ActiveRegionRefreshesRegionMax) {
+    Channels channels;
+    channels[B].value = 175;
+    channels[H].value = 95;
+    channels[L].value = 60;
+    HandStats hand;
+    hand.updateActiveRegion(channels.pixels, channels.virtualPixels, 0);
+    EXPECT_EQ(hand.regionMax, (std::array<float, kRegionCount>{0, 100, 0, 20}));
+}
+
+TEST(RegionTrackingTest, HoldMovesOnlyWithEnoughRelativeGrowth) {
+    const struct {
+        const char* name;
+        float currentBefore, candidateBefore, currentAfter, candidateAfter;
+        PixelRegion expected;
+        float gain;
+    } cases[] = {
+        {"grew 40%", 100, 50, 100, 70, U, 1.3f},       {"grew 20%", 100, 50, 100, 60, P, 1.3f},
+        {"current falling", 100, 50, 40, 30, P, 5.0f}, {"current was empty", 0, 50, 10, 1, U, 1.3f},
+        {"current now empty", 100, 50, 0, 30, U, 1.3f},
+    };
+    for (const auto& c : cases) {
+        Channels channels;
+        HandStats hand;
+        hand.activeRegion = P;
+        hand.regionMax = {0, c.currentBefore, 0, c.candidateBefore};
+        channels[A].value = static_cast<int32_t>(c.currentAfter) + 75;
+        channels[G].value = static_cast<int32_t>(c.candidateAfter) + 75;
+        EXPECT_EQ(hand.changeActiveRegion(channels.pixels, G), c.expected) << c.name;
+        EXPECT_EQ(hand.previousRegion, P) << c.name;
+        EXPECT_EQ(hand.regionSwitchGain, c.gain) << c.name;
+    }
+    // A strongest channel in the current region changes nothing, not even the region maxima.
+    HandStats hand;
+    hand.activeRegion = U;
+    hand.regionMax = {0, 7, 8, 9};
+    Channels channels;
+    channels[A].value = 500;
+    EXPECT_EQ(hand.changeActiveRegion(channels.pixels, H), U);
+    EXPECT_EQ(hand.regionMax, (std::array<float, kRegionCount>{0, 7, 8, 9}));
 }
 
 }  // namespace

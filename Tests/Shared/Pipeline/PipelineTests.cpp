@@ -1,158 +1,168 @@
+#include "Shared/Pipeline/Pipeline.h"
+
+#include <string>
+#include <tuple>
+#include <vector>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <string>
-#include <vector>
-
-#include "Shared/Pipeline/Pipeline.h"
 #include "Shared/Util/StateKey.h"
 
-using namespace ZeltoTouch;
-using testing::ElementsAre;
-
+namespace ZeltoTouch {
 namespace {
 
-std::vector<uint8_t> imageReport(uint32_t frameNumber) {
-    std::vector<uint8_t> bytes(73, 0);
+using testing::ElementsAre;
+using Bytes = std::vector<uint8_t>;
+
+Bytes imageReport(uint32_t frameNumber) {
+    Bytes bytes(73, 0);
     bytes[0] = 1;
     for (int i = 0; i < 4; ++i) bytes[1 + i] = static_cast<uint8_t>(frameNumber >> (8 * i));
     return bytes;
 }
 
-std::vector<uint8_t> firmwareEventReport(uint8_t event) { return {2, event, 1, 2, 3, 4, 5, 6, 7, 8}; }
+Bytes firmwareEventReport(uint8_t event) { return {2, event, 1, 2, 3, 4, 5, 6, 7, 8}; }
 
-// Installs every probe and writes one line per call, so tests can read the order.
-struct ProbeLog {
+template <typename Signature, typename F>
+void install(Pipeline::Probe<Signature>& probe, F f) {
+    probe = std::make_shared<std::function<Signature>>(std::move(f));
+}
+
+// A pipeline with every probe installed, each writing one line per call so tests can read the order.
+struct ProbedPipeline {
+    Pipeline pipeline;
     std::vector<std::string> calls;
-    std::vector<HIDEventList> eventLists;
 
-    explicit ProbeLog(Pipeline& pipeline) {
-        pipeline.setStateProbe = probe<void(uint64_t, const std::string&, const PropertyValue&)>(
-            [this](uint64_t, const std::string& key, const PropertyValue&) { calls.push_back("setState " + key); });
-        pipeline.getStateProbe =
-            probe<void(const std::string&)>([this](const std::string& key) { calls.push_back("getState " + key); });
-        pipeline.metadataProbe = probe<void(uint64_t, const std::string&, const PropertyValue&)>(
-            [this](uint64_t, const std::string& key, const PropertyValue&) { calls.push_back("metadata " + key); });
-        pipeline.inputReportProbe = probe<void(uint64_t, const uint8_t*, uint64_t)>(
-            [this](uint64_t, const uint8_t*, uint64_t length) { calls.push_back("input " + std::to_string(length)); });
-        pipeline.invalidInputReportProbe = probe<void(uint64_t, const uint8_t*, uint64_t)>(
-            [this](uint64_t, const uint8_t*, uint64_t) { calls.push_back("invalid"); });
-        pipeline.firmwareEventProbe = probe<void(uint64_t, const InputReport::FirmwareEvent&)>(
-            [this](uint64_t, const InputReport::FirmwareEvent& e) { calls.push_back("firmware " + std::to_string(e.event)); });
-        pipeline.imageProbe = probe<void(uint64_t, const InputReport::Image&)>(
-            [this](uint64_t, const InputReport::Image& i) { calls.push_back("image " + std::to_string(i.frameNumber)); });
-        pipeline.disjointImageProbe = probe<void(uint64_t, uint32_t, const InputReport::Image&)>(
-            [this](uint64_t, uint32_t previous, const InputReport::Image& i) {
-                calls.push_back("disjoint " + std::to_string(previous) + "->" + std::to_string(i.frameNumber));
-            });
-        pipeline.hidEventsProbe = probe<void(uint64_t, const HIDEventList&)>(
-            [this](uint64_t t, const HIDEventList& events) {
-                calls.push_back("events " + std::to_string(events.size()) + " @" + std::to_string(t));
-                eventLists.push_back(events);
-            });
+    ProbedPipeline() {
+        const auto log = [this](std::string line) { calls.push_back(std::move(line)); };
+        using Key = const std::string&;
+        using Value = const PropertyValue&;
+        using Image = const InputReport::Image&;
+        install(pipeline.setStateProbe, [=](uint64_t, Key key, Value) { log("setState " + key); });
+        install(pipeline.getStateProbe, [=](Key key) { log("getState " + key); });
+        install(pipeline.metadataProbe, [=](uint64_t, Key key, Value) { log("metadata " + key); });
+        install(pipeline.inputReportProbe,
+                [=](uint64_t, const uint8_t*, uint64_t n) { log("input " + std::to_string(n)); });
+        install(pipeline.invalidInputReportProbe, [=](uint64_t, const uint8_t*, uint64_t) { log("invalid"); });
+        install(pipeline.firmwareEventProbe,
+                [=](uint64_t, const InputReport::FirmwareEvent& e) { log("firmware " + std::to_string(e.event)); });
+        install(pipeline.imageProbe, [=](uint64_t, Image i) { log("image " + std::to_string(i.frameNumber)); });
+        install(pipeline.disjointImageProbe, [=](uint64_t, uint32_t previous, Image i) {
+            log("disjoint " + std::to_string(previous) + "->" + std::to_string(i.frameNumber));
+        });
+        install(pipeline.hidEventsProbe, [=](uint64_t, const HIDEventList& events) {
+            for (const HIDEventRef& event : events) log(event->description());
+        });
     }
-
-    template <typename Signature, typename F>
-    static Pipeline::Probe<Signature> probe(F f) {
-        return std::make_shared<std::function<Signature>>(std::move(f));
+    void feed(std::initializer_list<Bytes> reports, uint64_t timestamp = 0) {
+        for (const Bytes& report : reports) pipeline.handleInputReport(timestamp, report.data(), report.size());
     }
+    uint64_t debugCounter(const char* key) { return pipeline.getState("DebugInfo").get(key).toUInt64(); }
 };
 
-void feed(Pipeline& pipeline, const std::vector<uint8_t>& report, uint64_t timestamp = 0) {
-    pipeline.handleInputReport(timestamp, report.data(), report.size());
+TEST(InputReport, ParsesOnlyReportsOfTheirIdAndMinimumLength) {
+    const std::tuple<uint8_t, size_t, bool, bool, bool> cases[] = {  // id, length, image, firmware event, hold
+        {1, 73, true, false, false}, {1, 72, false, false, false}, {2, 10, false, true, false},
+        {2, 9, false, false, false}, {31, 5, false, false, true},  {31, 4, false, false, false},
+        {3, 200, false, false, false},
+    };
+    for (const auto& [id, length, image, firmwareEvent, holdDuration] : cases) {
+        Bytes bytes(length, 0);
+        bytes[0] = id;
+        SCOPED_TRACE(testing::Message() << "id " << int(id) << " length " << length);
+        EXPECT_EQ(InputReport::Image::parse(bytes.data(), length).has_value(), image);
+        EXPECT_EQ(InputReport::FirmwareEvent::parse(bytes.data(), length).has_value(), firmwareEvent);
+        EXPECT_EQ(FeatureReport::FactoryResetHoldDuration::parse(bytes.data(), length).has_value(), holdDuration);
+    }
+    EXPECT_FALSE(InputReport::Image::parse(nullptr, 0));  // a zero-length report is never read
+    EXPECT_FALSE(InputReport::FirmwareEvent::parse(nullptr, 0));
+    EXPECT_FALSE(FeatureReport::FactoryResetHoldDuration::parse(nullptr, 0));
 }
 
-uint32_t debugCounter(Pipeline& pipeline, const char* key) {
-    return static_cast<uint32_t>(pipeline.getState("DebugInfo").get(key).toUInt64());
-}
+TEST(InputReport, FieldsAreLittleEndianAndPixelsSignedOrUnsigned) {
+    Bytes bytes(100, 0xAB);  // the tail after 73 bytes is ignored
+    const uint8_t header[] = {1, 0xFF, 0xFF, 0xFF, 0xFF, 0xE8, 0x03, 0, 0, 9, 8, 7, 6};
+    std::copy(std::begin(header), std::end(header), bytes.begin());
+    std::fill(bytes.begin() + 13, bytes.begin() + 73, 0);
+    bytes[13] = bytes[14] = 0xFF;                  // unsigned A
+    bytes[43] = bytes[44] = 0xFF;                  // signed A
+    bytes[43 + 28] = 0x34, bytes[43 + 29] = 0x12;  // signed O
+    const auto image = InputReport::Image::parse(bytes.data(), bytes.size());
+    ASSERT_TRUE(image);
+    EXPECT_EQ(image->frameNumber, 4294967295u);
+    EXPECT_EQ(image->timestampMs, 1000u);
+    EXPECT_EQ(image->aux, (std::array<uint8_t, 4>{9, 8, 7, 6}));
+    EXPECT_EQ(image->unsignedPixels[0], 65535);
+    EXPECT_EQ(image->signedPixels[0], -1);
+    EXPECT_EQ(image->signedPixels[14], 0x1234);
+    EXPECT_EQ(image->unsignedPixels[14], 0);
 
-}  // namespace
+    const Bytes event = firmwareEventReport(0);
+    EXPECT_EQ(InputReport::FirmwareEvent::parse(event.data(), event.size())->context,
+              (std::array<uint8_t, 8>{1, 2, 3, 4, 5, 6, 7, 8}));
+    const uint8_t hold[] = {0x1F, 0x10, 0x27, 0x00, 0x00};
+    EXPECT_EQ(FeatureReport::FactoryResetHoldDuration::parse(hold, sizeof hold), 10000u);
+}
 
 TEST(Pipeline, ImagesCallProbesInOrderAndCountGapsWithWrap) {
-    Pipeline pipeline;
-    ProbeLog log(pipeline);
-    for (uint32_t frame : {5u, 6u, 8u, 4294967295u, 0u, 0u}) feed(pipeline, imageReport(frame));
-
-    EXPECT_THAT(log.calls, ElementsAre("input 73", "image 5", "input 73", "image 6", "input 73", "image 8",
-                                       "disjoint 6->8", "input 73", "image 4294967295", "disjoint 8->4294967295",
-                                       "input 73", "image 0", "input 73", "image 0", "disjoint 0->0"));
-    EXPECT_EQ(debugCounter(pipeline, "DisjointImageCount"), 3u);
-    EXPECT_EQ(debugCounter(pipeline, "ResetCount"), 0u);
+    ProbedPipeline p;
+    for (uint32_t frame : {5u, 6u, 8u, 4294967295u, 0u, 0u}) p.feed({imageReport(frame)});
+    EXPECT_THAT(p.calls, ElementsAre("input 73", "image 5", "input 73", "image 6", "input 73", "image 8",
+                                     "disjoint 6->8", "input 73", "image 4294967295", "disjoint 8->4294967295",
+                                     "input 73", "image 0", "input 73", "image 0", "disjoint 0->0"));
+    EXPECT_EQ(p.debugCounter("DisjointImageCount"), 3u);
+    EXPECT_EQ(p.debugCounter("ResetCount"), 0u);
 }
 
 TEST(Pipeline, FirmwareResetAppendsVendorEventStampedWithReportTime) {
-    Pipeline pipeline;
-    ProbeLog log(pipeline);
-    feed(pipeline, firmwareEventReport(0), 777);
-
-    EXPECT_THAT(log.calls, ElementsAre("input 10", "firmware 0", "events 1 @777"));
-    ASSERT_EQ(log.eventLists.size(), 1u);
-    const HIDEventRef& reset = log.eventLists[0].back();
-    EXPECT_EQ(reset->type(), kHIDEventTypeVendorDefined);
-    EXPECT_EQ(reset->usagePage(), 0xFF60);
-    EXPECT_EQ(reset->usage(), 2);
-    EXPECT_EQ(reset->version(), 0u);
-    EXPECT_TRUE(reset->data().empty());
-    EXPECT_EQ(reset->timestamp(), 777u);
-    EXPECT_EQ(debugCounter(pipeline, "ResetCount"), 1u);
+    ProbedPipeline p;
+    p.feed({firmwareEventReport(0)}, 777);
+    EXPECT_THAT(p.calls, ElementsAre("input 10", "firmware 0",
+                                     "HIDEvent vendor-defined ts=777 phase=0x0 options=0x0 usagePage=0xff60 usage=0x2 "
+                                     "version=0 length=0"));
+    EXPECT_EQ(p.debugCounter("ResetCount"), 1u);
 }
 
 TEST(Pipeline, OtherFirmwareEventsAndInvalidReportsOnlyReachTheirProbes) {
-    Pipeline pipeline;
-    ProbeLog log(pipeline);
-    feed(pipeline, firmwareEventReport(3));
-    feed(pipeline, {});
-    feed(pipeline, {1, 2, 3});
-    feed(pipeline, std::vector<uint8_t>(72, 1));
-
-    EXPECT_THAT(log.calls, ElementsAre("input 10", "firmware 3", "input 0", "invalid", "input 3", "invalid",
-                                       "input 72", "invalid"));
-    EXPECT_EQ(debugCounter(pipeline, "ResetCount"), 0u);
+    ProbedPipeline p;
+    p.feed({firmwareEventReport(3), {}, {1, 2, 3}, Bytes(72, 1)});
+    EXPECT_THAT(p.calls, ElementsAre("input 10", "firmware 3", "input 0", "invalid", "input 3", "invalid", "input 72",
+                                     "invalid"));
+    EXPECT_EQ(p.debugCounter("ResetCount"), 0u);
 }
 
 TEST(Pipeline, ResetDoesNotForgetTheLastFrameNumber) {
-    Pipeline pipeline;
-    feed(pipeline, imageReport(10));
-    feed(pipeline, firmwareEventReport(0));
-    feed(pipeline, firmwareEventReport(0));
-    feed(pipeline, imageReport(11));
-    feed(pipeline, imageReport(13));
-    EXPECT_EQ(debugCounter(pipeline, "ResetCount"), 2u);
-    EXPECT_EQ(debugCounter(pipeline, "DisjointImageCount"), 1u);
+    ProbedPipeline p;
+    p.feed({imageReport(10), firmwareEventReport(0), firmwareEventReport(0), imageReport(11), imageReport(13)});
+    EXPECT_EQ(p.debugCounter("ResetCount"), 2u);
+    EXPECT_EQ(p.debugCounter("DisjointImageCount"), 1u);
 }
 
 TEST(Pipeline, StateKeysRouteByDomain) {
-    Pipeline pipeline;
-    ProbeLog log(pipeline);
-    pipeline.setState(1, "Other.Key", PropertyValue::fromUInt32(1));
-    pipeline.handleMetadata(2, "Accel", PropertyValue::null());
-    EXPECT_FALSE(pipeline.getState("Unknown").hasValue());
-    EXPECT_FALSE(pipeline.getState("Algs").hasValue());
-    EXPECT_TRUE(pipeline.getState("DebugInfo").isDictionary());
-    EXPECT_THAT(log.calls,
-                ElementsAre("setState Other.Key", "metadata Accel", "getState Unknown", "getState Algs", "getState DebugInfo"));
+    ProbedPipeline p;
+    p.pipeline.setState(1, "Other.Key", PropertyValue::fromUInt32(1));
+    p.pipeline.handleMetadata(2, "Accel", PropertyValue::null());
+    EXPECT_FALSE(p.pipeline.getState("Unknown").hasValue());
+    EXPECT_FALSE(p.pipeline.getState("Algs").hasValue());
+    EXPECT_TRUE(p.pipeline.getState("DebugInfo").isDictionary());
+    EXPECT_THAT(p.calls, ElementsAre("setState Other.Key", "metadata Accel", "getState Unknown", "getState Algs",
+                                     "getState DebugInfo"));
 }
 
 TEST(StripDomainFromKey, StripsExactlyOneLeadingDomainAndPoint) {
-    struct Case {
-        const char* key;
-        const char* domain;
-        bool stripped;
-        const char* rest;
-    };
-    const Case cases[] = {
-        {"Algs.ActivationThreshold", "Algs", true, "ActivationThreshold"},
-        {"Algs.", "Algs", true, ""},
-        {"Algs", "Algs", false, "Algs"},
-        {"AlgsX.Key", "Algs", false, "AlgsX.Key"},
-        {"Alg", "Algs", false, "Alg"},
+    const std::tuple<const char*, const char*, bool, const char*> cases[] = {
+        {"Algs.ActivationThreshold", "Algs", true, "ActivationThreshold"}, {"Algs.", "Algs", true, ""},
+        {"Algs", "Algs", false, "Algs"}, {"AlgsX.Key", "Algs", false, "AlgsX.Key"}, {"Alg", "Algs", false, "Alg"},
         {"Pipeline.Pipeline.DebugInfo", "Pipeline", true, "Pipeline.DebugInfo"},
-        {"pipeline.DebugInfo", "Pipeline", false, "pipeline.DebugInfo"},
-        {"", "Algs", false, ""},
+        {"pipeline.DebugInfo", "Pipeline", false, "pipeline.DebugInfo"}, {"", "Algs", false, ""},
     };
-    for (const Case& c : cases) {
-        std::string key = c.key;
-        EXPECT_EQ(Util::stripDomainFromKey(key, c.domain), c.stripped) << c.key;
-        EXPECT_EQ(key, c.rest) << c.key;
+    for (const auto& [original, domain, stripped, rest] : cases) {
+        std::string key = original;
+        EXPECT_EQ(Util::stripDomainFromKey(key, domain), stripped) << original;
+        EXPECT_EQ(key, rest) << original;
     }
 }
+
+}  // namespace
+}  // namespace ZeltoTouch
