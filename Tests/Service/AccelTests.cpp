@@ -5,119 +5,83 @@
 
 #include <gtest/gtest.h>
 
-#include "Platform/EventSystemService.h"
 #include "Platform/RunLoop.h"
 #include "Service/AccelBookkeeping.h"
 #include "Service/AccelSystem.h"
-#include "Tests/Service/ServiceInspector.h"
+#include "Shared/Recording/PipelineRecording.h"
+#include "Shared/Util/HostClock.h"
 #include "Tests/Service/ServiceTestSupport.h"
 
 namespace ZeltoTouch::ServiceTest {
 namespace {
 
-// A stage that keeps the metadata it receives.
-class MetadataLog final : public PipelineInput {
-public:
-    void setState(uint64_t, const std::string&, const PropertyValue&) override { ADD_FAILURE() << "state write"; }
-    void handleInputReport(uint64_t, const uint8_t*, uint64_t) override { ADD_FAILURE() << "input report"; }
-    void handleMetadata(uint64_t timestampMach, const std::string& key, const PropertyValue& value) override {
-        EXPECT_EQ(key, "Accel");
-        timestamps.push_back(timestampMach);
-        values.push_back(value);
-    }
-
-    std::vector<uint64_t> timestamps;
-    std::vector<PropertyValue> values;
-};
-
-AccelSample sampleAt(uint64_t timestamp) {
-    return {timestamp, static_cast<float>(timestamp) * 0.5f, -0.25f, -1.0f};
-}
-
-class AccelBookkeepingTest : public testing::Test {
-protected:
-    void feed(uint64_t from, uint64_t count) {
-        for (uint64_t t = from; t < from + count; ++t) accel.handleSample(sampleAt(t), recording);
+// Samples stamped from, from+1, ... go in; the timestamps of what was recorded come out.
+struct AccelFeed {
+    std::vector<uint64_t> feed(uint64_t from, uint64_t count) {
+        for (uint64_t t = from; t < from + count; ++t) accel.handleSample({t, 0.1f, -0.2f, -0.98f}, recording);
+        std::vector<uint64_t> timestamps;
+        for (const PipelineRecording::Frame& frame : recording.frames()) timestamps.push_back(frame.timestamp);
+        return timestamps;
     }
 
     AccelBookkeeping accel;
-    MetadataLog recording;
+    PipelineRecording recording;  // the monotonic clock's mach time is in nanoseconds
 };
 
-TEST_F(AccelBookkeepingTest, UnarmedItBuffersTheLatestHundredAndRecordsNothing) {
-    feed(1, 250);
-    EXPECT_TRUE(recording.timestamps.empty());
-    ASSERT_EQ(accel.samples.size(), 100u);
-    EXPECT_EQ(accel.samples.front().timestamp, 151u);
-    EXPECT_EQ(accel.samples.back().timestamp, 250u);
-}
+TEST(AccelBookkeeping, BuffersTheLatestHundredUntilArmedThenFlushesThemAndForwardsAHundred) {
+    AccelFeed f;
+    EXPECT_TRUE(f.feed(1, 250).empty());
+    ASSERT_EQ(f.accel.samples.size(), 100u);
+    f.accel.arm();
+    const std::vector<uint64_t> flushed = f.feed(251, 1);
+    ASSERT_EQ(flushed.size(), 101u);
+    for (uint64_t i = 0; i < 101; ++i) EXPECT_EQ(flushed[i], 151 + i);
+    EXPECT_EQ(f.accel.samplesNeededCount, 99u);
+    EXPECT_TRUE(f.accel.samples.empty());
 
-TEST_F(AccelBookkeepingTest, ArmedItFlushesTheHistoryThenForwardsAHundredSamples) {
-    feed(1, 100);
-    accel.arm();
-    feed(101, 1);
-    ASSERT_EQ(recording.timestamps.size(), 101u);
-    for (uint64_t i = 0; i < 101; ++i) EXPECT_EQ(recording.timestamps[i], i + 1);
-    EXPECT_EQ(accel.samplesNeededCount, 99u);
-    EXPECT_TRUE(accel.samples.empty());
+    EXPECT_EQ(f.feed(252, 100).size(), 200u) << "the hundredth sample after arming is the last recorded";
+    EXPECT_EQ(f.accel.samplesNeededCount, 0u);
+    EXPECT_EQ(f.accel.samples.size(), 1u);
 
-    feed(102, 99);
-    EXPECT_EQ(recording.timestamps.size(), 200u);
-    EXPECT_EQ(accel.samplesNeededCount, 0u);
-    feed(201, 1);
-    EXPECT_EQ(recording.timestamps.size(), 200u) << "buffering again";
-    EXPECT_EQ(accel.samples.size(), 1u);
-}
-
-TEST_F(AccelBookkeepingTest, ArmingWhileForwardingStartsTheCountAgain) {
-    accel.arm();
-    feed(1, 40);
-    EXPECT_EQ(accel.samplesNeededCount, 60u);
-    accel.arm();
-    EXPECT_EQ(accel.samplesNeededCount, 100u);
-    feed(41, 100);
-    EXPECT_EQ(recording.timestamps.size(), 140u);
-    EXPECT_EQ(accel.samplesNeededCount, 0u);
-}
-
-TEST(AccelMetadata, CarriesXYZAsSinglePrecisionNumbers) {
-    const PropertyValue value = AccelBookkeeping::metadataValue({5, 0.1f, -0.2f, -0.98f});
-    ASSERT_TRUE(value.isDictionary());
-    EXPECT_EQ(value.count(), 3u);
-    for (const char* axis : {"X", "Y", "Z"}) {
-        EXPECT_EQ(value.get(axis).numberKind(), PropertyValue::NumberKind::Float32) << axis;
+    const PipelineRecording::Frame& frame = f.recording.frames().front();
+    EXPECT_EQ(frame.key, "Accel");
+    EXPECT_EQ(frame.value.count(), 3u);
+    for (const auto& [axis, expected] : {std::pair{"X", 0.1f}, {"Y", -0.2f}, {"Z", -0.98f}}) {
+        EXPECT_EQ(frame.value.get(axis).numberKind(), PropertyValue::NumberKind::Float32) << axis;
+        EXPECT_EQ(frame.value.get(axis).toFloat(), expected) << axis;
     }
-    EXPECT_EQ(value.get("X").toFloat(), 0.1f);
-    EXPECT_EQ(value.get("Y").toFloat(), -0.2f);
-    EXPECT_EQ(value.get("Z").toFloat(), -0.98f);
+}
+
+TEST(AccelBookkeeping, ArmingWhileForwardingStartsTheCountAgain) {
+    AccelFeed f;
+    f.accel.arm();
+    f.feed(1, 40);
+    EXPECT_EQ(f.accel.samplesNeededCount, 60u);
+    f.accel.arm();
+    EXPECT_EQ(f.feed(41, 101).size(), 140u);
+    EXPECT_EQ(f.accel.samplesNeededCount, 0u);
 }
 
 TEST(ServiceAccelerometerHandler, RecordsNarrowedSamplesAtArrivalTime) {
     ServicePointer service = makeService();
-    ZeltoTouchHIDServiceInspector inspector(*service);
-    auto event = HIDEvent::createAccelerometerEvent(1, 0.1, -0.2, -0.98, 0);
     const uint64_t before = Util::hostClock().machTimeNow();
-    service->handleAccelerometerEvent(*event);
+    service->handleAccelerometerEvent(*HIDEvent::createAccelerometerEvent(1, 0.1, -0.2, -0.98, 0));
 
-    const AccelBookkeeping accel = inspector.accel();
+    const AccelBookkeeping accel = ZeltoTouchHIDServiceInspector(*service).accel();
     ASSERT_EQ(accel.samples.size(), 1u);
     EXPECT_GE(accel.samples.front().timestamp, before) << "the arrival time, not the event's";
     EXPECT_EQ(accel.samples.front().x, 0.1f);
     EXPECT_EQ(accel.samples.front().z, -0.98f);
-    EXPECT_TRUE(inspector.recording().frames().empty());
 }
 
-TEST(AccelSystemConstruction, MissingArgumentsAreRefused) {
-    const auto runLoop = Platform::RunLoop::current();
+TEST(AccelSystemConstruction, MissingArgumentsAndARateOfZeroAreRefused) {
+    const auto loop = Platform::RunLoop::current();
     const AccelSystem::Handler handler = [](const HIDEvent&) {};
-    struct Case {
-        std::shared_ptr<Platform::RunLoop> runLoop;
-        std::string mode;
-        AccelSystem::Handler handler;
-    };
-    for (const Case& c : {Case{nullptr, "mode", handler}, Case{runLoop, "", handler}, Case{runLoop, "mode", nullptr}}) {
+    using Case = std::tuple<std::shared_ptr<Platform::RunLoop>, const char*, uint32_t, AccelSystem::Handler>;
+    for (const auto& [runLoop, mode, rate, onEvent] : {Case{nullptr, "mode", 100, handler}, Case{loop, "", 100, handler},
+                                                      Case{loop, "mode", 100, nullptr}, Case{loop, "mode", 0, handler}}) {
         try {
-            AccelSystem accel(c.runLoop, c.mode, 100, c.handler);
+            AccelSystem accel(runLoop, mode, rate, onEvent);
             ADD_FAILURE() << "constructed";
         } catch (const std::invalid_argument& error) {
             EXPECT_STREQ(error.what(), "nil argument");
@@ -125,26 +89,13 @@ TEST(AccelSystemConstruction, MissingArgumentsAreRefused) {
     }
 }
 
-TEST(AccelSystemConstruction, AsksTheAccelerometerForTheRateAsAnInterval) {
-    EXPECT_EQ(AccelSystem::reportIntervalMicroseconds(100), 10000.0);
-    const auto services = Platform::EventServiceRegistry::shared().services();
-    ASSERT_FALSE(services.empty());
-    AccelSystem accel(Platform::RunLoop::current(), "AccelTest", 50, [](const HIDEvent&) {});
-    EXPECT_EQ(services.front()->copyProperty("ReportInterval").toDouble(), 20000.0);
-    accel.cleanup();
-    accel.cleanup();
-}
-
 TEST(AccelSystemConstruction, FailsWhenTheEventSystemHasNoClientOrNoAccelerometer) {
-    auto& registry = Platform::EventServiceRegistry::shared();
-    registry.setClientCreationRefused(true);
-    EXPECT_THROW(AccelSystem(Platform::RunLoop::current(), "AccelTest", 100, [](const HIDEvent&) {}),
-                 std::runtime_error);
-    registry.setClientCreationRefused(false);
-
+    const auto construct = [] { AccelSystem(Platform::RunLoop::current(), "AccelTest", 100, [](const HIDEvent&) {}); };
+    Platform::EventServiceRegistry::shared().setClientCreationRefused(true);
+    EXPECT_THROW(construct(), std::runtime_error);
+    Platform::EventServiceRegistry::shared().setClientCreationRefused(false);
     const ScopedEventServices none({});
-    EXPECT_THROW(AccelSystem(Platform::RunLoop::current(), "AccelTest", 100, [](const HIDEvent&) {}),
-                 std::runtime_error);
+    EXPECT_THROW(construct(), std::runtime_error);
 }
 
 // An event-system service that matches the accelerometer's usage and sends a mix of events.
@@ -152,34 +103,39 @@ class MixedEventsService final : public Platform::EventSystemService {
 public:
     PropertyValue copyProperty(std::string_view key) const override {
         if (key == "PrimaryUsagePage") return PropertyValue::fromUInt32(0xFF00);
-        if (key == "PrimaryUsage") return PropertyValue::fromUInt32(3);
-        return {};
+        return key == "PrimaryUsage" ? PropertyValue::fromUInt32(3) : PropertyValue();
     }
-    bool setProperty(std::string_view, const PropertyValue&) override { return true; }
+    bool setProperty(std::string_view key, const PropertyValue& value) override {
+        if (key == "ReportInterval") reportInterval = value.toDouble();
+        return true;
+    }
     std::unique_ptr<Platform::EventStream> openStream(const std::shared_ptr<Platform::RunLoop>& runLoop,
                                                       const std::string& mode,
                                                       Platform::HIDEventHandler handler) override {
-        const HIDEventRef events[] = {
-            HIDEvent::createDigitizerEvent(1, 2, 0, 0, 0, 0, 0, 1, 0, 0, 0, false, false, 0),
-            HIDEvent::createAccelerometerEvent(2, 0.5, 0, -1, 0),
-            HIDEvent::createVendorDefinedEvent(3, 0xFF60, 2, 0, nullptr, 0, 0),
-            HIDEvent::createAccelerometerEvent(4, 0.25, 0, -1, 0),
-        };
-        for (const HIDEventRef& event : events) runLoop->perform(mode, [handler, event] { handler(event); });
+        for (const HIDEventRef& event : {HIDEvent::createDigitizerEvent(1, 2, 0, 0, 0, 0, 0, 1, 0, 0, 0, false, false, 0),
+                                         HIDEvent::createAccelerometerEvent(2, 0.5, 0, -1, 0),
+                                         HIDEvent::createVendorDefinedEvent(3, 0xFF60, 2, 0, nullptr, 0, 0),
+                                         HIDEvent::createAccelerometerEvent(4, 0.25, 0, -1, 0)}) {
+            runLoop->perform(mode, [handler, event] { handler(event); });
+        }
         runLoop->perform(mode, [runLoop] { runLoop->stop(); });
         return std::make_unique<Platform::EventStream>();
     }
+
+    double reportInterval = 0;
 };
 
-TEST(AccelSystemDelivery, OnlyAccelerometerEventsReachTheHandlerOnTheRunLoop) {
-    const ScopedEventServices mixed({std::make_shared<MixedEventsService>()});
+TEST(AccelSystemDelivery, AsksForTheRateAsAnIntervalAndPassesOnlyAccelerometerEvents) {
+    const auto mixed = std::make_shared<MixedEventsService>();
+    const ScopedEventServices only({mixed});
     std::vector<uint64_t> timestamps;
-    {
-        AccelSystem accel(Platform::RunLoop::current(), "AccelTest", 100,
-                          [&](const HIDEvent& event) { timestamps.push_back(event.timestamp()); });
-        Platform::RunLoop::current()->runInMode("AccelTest");
-    }
+    AccelSystem accel(Platform::RunLoop::current(), "AccelTest", 50,
+                      [&](const HIDEvent& event) { timestamps.push_back(event.timestamp()); });
+    EXPECT_EQ(mixed->reportInterval, 20000.0) << "microseconds between samples";
+    Platform::RunLoop::current()->runInMode("AccelTest");
     EXPECT_EQ(timestamps, (std::vector<uint64_t>{2, 4}));
+    accel.cleanup();
+    accel.cleanup();
 }
 
 }  // namespace

@@ -1,3 +1,9 @@
+// The service with its input report thread running; run under ThreadSanitizer too.
+
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <string>
 #include <thread>
 #include <vector>
 
@@ -5,8 +11,9 @@
 
 #include "Platform/Thread.h"
 #include "Platform/Trace.h"
+#include "Shared/Recording/PipelineRecording.h"
+#include "Shared/Util/HostClock.h"
 #include "Shared/Util/MachTime.h"
-#include "Tests/Service/ServiceInspector.h"
 #include "Tests/Service/ServiceTestSupport.h"
 
 namespace ZeltoTouch::ServiceTest {
@@ -27,8 +34,8 @@ protected:
         queue->barrier();
     }
 
-    void schedule() {
-        service->setEventCallback(EventCollector::callback, &collector, &refcon);
+    void schedule(bool withCallback = true) {
+        if (withCallback) service->setEventCallback(EventCollector::callback, &collector, &refcon);
         service->scheduleWithDispatchQueue(queue);
         ASSERT_TRUE(registered.device->waitUntilScheduled());
     }
@@ -42,94 +49,91 @@ protected:
     ServicePointer service = makeService();
     ZeltoTouchHIDServiceInspector inspector{*service};
     std::shared_ptr<Platform::DispatchQueue> queue = Platform::DispatchQueue::create("test host queue");
-    EventCollector collector{queue};
     int refcon = 0;
+    EventCollector collector{queue, &refcon, service->getServiceInterface()};
 };
 
-TEST_F(ServiceThread, ScheduleInstallsSixProbesAndUnscheduleRemovesThemAndEndsTheThread) {
+TEST_F(ServiceThread, ScheduleStartsOneThreadWithSixProbesASecondReplacesItAndUnscheduleEndsIt) {
     schedule();
     EXPECT_EQ(inspector.installedProbeCount(), 6);
     EXPECT_EQ(threadCount(), baselineThreads + 1);
     EXPECT_EQ(logCapture().countEqual("input report thread start"), 1u);
 
-    service->unscheduleWithDispatchQueue(queue);
+    auto secondQueue = Platform::DispatchQueue::create("second host queue");
+    EventCollector secondCollector(secondQueue, nullptr, service->getServiceInterface());
+    const long references = secondQueue.use_count();
+    service->setEventCallback(EventCollector::callback, &secondCollector, nullptr);
+    service->scheduleWithDispatchQueue(secondQueue);
+    ASSERT_TRUE(registered.device->waitUntilScheduled());
+    EXPECT_EQ(threadCount(), baselineThreads + 2) << "one input report thread and the second queue";
+    EXPECT_EQ(logCapture().countEqual("input report thread end"), 1u);
+    deliverAll(reportsOfScript(kTapScript));
+    secondQueue->barrier();
+    EXPECT_TRUE(collector.events().empty());
+    EXPECT_FALSE(secondCollector.events().empty());
+
+    service->unscheduleWithDispatchQueue(secondQueue);
     EXPECT_EQ(inspector.installedProbeCount(), 0);
-    EXPECT_FALSE(inspector.hasInputReportRunLoop());
-    EXPECT_EQ(inspector.dispatchEventInfo().queue, nullptr);
-    EXPECT_EQ(threadCount(), baselineThreads);
-    EXPECT_FALSE(registered.device->isScheduled());
+    EXPECT_EQ(threadCount(), baselineThreads + 1) << "only the second queue's";
+    EXPECT_EQ(secondQueue.use_count(), references);
+    EXPECT_FALSE(registered.device->post({0x01})) << "the device is unscheduled";
     for (const char* line : {"signalling input report thread to exit", "waiting for input report thread to exit",
                              "input report thread end", "input report thread exited"}) {
-        EXPECT_EQ(logCapture().countEqual(line), 1u) << line;
+        EXPECT_EQ(logCapture().countEqual(line), 2u) << line;
     }
 }
 
-TEST_F(ServiceThread, UnschedulingWithoutSchedulingOnlyLetsGoOfTheQueue) {
+TEST_F(ServiceThread, WithoutASchedulingOrADeviceNoThreadStartsNoQueueIsKeptAndOpenFails) {
     const long references = queue.use_count();
     service->unscheduleWithDispatchQueue(queue);
     EXPECT_EQ(logCapture().countEqual("signalling input report thread to exit"), 0u);
-    EXPECT_EQ(queue.use_count(), references) << "no reference kept";
-    EXPECT_EQ(inspector.dispatchEventInfo().queue, nullptr);
+    EXPECT_EQ(service->stop(), kZeltoSuccess);
+    EXPECT_EQ(service->stop(), kZeltoSuccess) << "twice is harmless";
+    EXPECT_FALSE(service->openWithOptions(1));
+    service->closeWithOptions(1);
+    EXPECT_EQ(registered.device->openOptions, (std::vector<uint32_t>{0})) << "only the fixture's";
+    EXPECT_TRUE(registered.device->closeOptions.empty());
+    service->scheduleWithDispatchQueue(queue);
     EXPECT_EQ(threadCount(), baselineThreads);
+    EXPECT_EQ(logCapture().countContaining("no device"), 1u);
+    service->unscheduleWithDispatchQueue(queue);
+    EXPECT_EQ(queue.use_count(), references);
 }
 
-TEST_F(ServiceThread, EventsReachTheCallbackOnTheHostQueueInOrder) {
-    schedule();
-    const auto reports = reportsOfScript(kTapScript);
-    deliverAll(reports);
-
-    const auto expected = pipelineEvents(reports);
-    ASSERT_FALSE(expected.empty());
-    EXPECT_EQ(collector.events(), expected);
-    for (const auto& delivery : collector.deliveries()) {
-        EXPECT_TRUE(delivery.onQueue);
-        EXPECT_EQ(delivery.target, &collector);
-        EXPECT_EQ(delivery.refcon, &refcon);
-        EXPECT_EQ(delivery.sender, service->getServiceInterface());
-        EXPECT_EQ(delivery.options, 0u);
-    }
-    EXPECT_EQ(logCapture().countContaining("Dispatch event: "), expected.size());
-}
-
-TEST_F(ServiceThread, ADigitizerEventArmsTheAccelerometerFeed) {
+TEST_F(ServiceThread, ADigitizerEventArmsTheAccelerometerFeedAndWithoutCallbackEventsAreDropped) {
     const ScopedEventServices noAccelerometer({});  // no samples, so nothing counts down
-    schedule();
+    schedule(false);
     EXPECT_EQ(logCapture().countContaining("Failed to create accel system: "), 1u);
     EXPECT_EQ(inspector.accel().samplesNeededCount, 0u);
     deliverAll(reportsOfScript(kTapScript));
-    ASSERT_FALSE(collector.events().empty());
+    EXPECT_GT(logCapture().countContaining("Dispatch event: "), 0u);
+    EXPECT_TRUE(collector.events().empty());
     EXPECT_EQ(inspector.accel().samplesNeededCount, 100u);
 }
 
-TEST_F(ServiceThread, ReportsAreStampedWithTheProcessingTime) {
-    schedule();
-    const uint64_t before = Util::hostClock().machTimeNow();
-    ASSERT_TRUE(registered.device->deliver({0x01, 0x02}));
-    const uint64_t after = Util::hostClock().machTimeNow();
-    const auto frames = inspector.recording().frames();
-    const auto report = std::find_if(frames.begin(), frames.end(), [](const PipelineRecording::Frame& frame) {
-        return frame.type == PipelineRecording::Frame::Type::InputReport;
-    });
-    ASSERT_NE(report, frames.end());
-    EXPECT_GE(report->timestamp, Util::nanosecondsFromMachTime(before));
-    EXPECT_LE(report->timestamp, Util::nanosecondsFromMachTime(after));
-    EXPECT_EQ(logCapture().countEqual(
-                  "Received input report (type 0, reportID 1, reportLength 2, timestampMach 7)"),
-              1u);
-}
-
-TEST_F(ServiceThread, ProbesTraceAndLog) {
+TEST_F(ServiceThread, ReportsAreStampedWithTheProcessingTimeAndProbesTraceAndLog) {
     Platform::ScopedTraceRecorder traces;
     schedule();
+    const uint64_t before = Util::hostClock().machTimeNow();
     ASSERT_TRUE(registered.device->deliver({0x07, 0x08}));
+    const uint64_t after = Util::hostClock().machTimeNow();
     ASSERT_TRUE(registered.device->deliver({}));
     ASSERT_TRUE(registered.device->deliver({0x02, 0x05, 0x01, 0x02, 0x03, 0x04, 0x05, 0x06, 0x07, 0x08}));
     ASSERT_TRUE(registered.device->deliver({0x02, 0x00, 0, 0, 0, 0, 0, 0, 0, 0}));  // a reset: one vendor event
-    queue->barrier();
+    auto images = reportsOfScript("idle 40ms\n");
+    images.erase(images.begin() + 1);  // frame 1 goes missing
+    deliverAll(images);
+
+    const PipelineRecording recording(service->getPropertyForKey(PropertyValue::string("Recording")));
+    const auto report =
+        std::ranges::find(recording.frames(), PipelineRecording::Frame::Type::InputReport, &PipelineRecording::Frame::type);
+    ASSERT_NE(report, recording.frames().end());
+    EXPECT_GE(report->timestamp, Util::nanosecondsFromMachTime(before));
+    EXPECT_LE(report->timestamp, Util::nanosecondsFromMachTime(after));
 
     using Record = Platform::TraceRecorder::Record;
     const auto inputTraces = traces.recorder().recordsWithCode(0x2B150180);
-    ASSERT_EQ(inputTraces.size(), 4u);
+    ASSERT_EQ(inputTraces.size(), 4 + images.size());
     EXPECT_EQ(inputTraces[0], (Record{0x2B150180, {7, 8, 0, 0}}));
     EXPECT_EQ(inputTraces[1], (Record{0x2B150180, {0, 0, 0, 0}}));
     EXPECT_EQ(inputTraces[2], (Record{0x2B150180, {2, 5, 1, 2}}));
@@ -139,23 +143,13 @@ TEST_F(ServiceThread, ProbesTraceAndLog) {
     EXPECT_EQ(traces.recorder().recordsWithCode(0x2B150188),
               (std::vector<Record>{{0x2B150188, {kHIDEventTypeVendorDefined, 0, 0, 0}}}));
 
-    EXPECT_EQ(logCapture().countEqual("Invalid input report with ID 7"), 1u);
-    EXPECT_EQ(logCapture().countEqual("Invalid input report len==0"), 1u);
-    EXPECT_EQ(logCapture().countEqual("Firmware event probe; event: 5, context: 102030405060708"), 1u);
-    EXPECT_EQ(logCapture().countEqual("HID events probe: 1 event(s)"), 1u);
-    EXPECT_EQ(logCapture().countEqual("Dispatch 1 event(s) takeoff"), 1u);
-    EXPECT_EQ(logCapture().countEqual("Dispatch 1 event(s) land"), 1u);
-}
-
-TEST_F(ServiceThread, ImageProbesLogFramesAndGaps) {
-    schedule();
-    auto reports = reportsOfScript("idle 40ms\n");
-    ASSERT_GE(reports.size(), 3u);
-    reports.erase(reports.begin() + 1);  // frame 1 goes missing
-    deliverAll(reports);
-    EXPECT_EQ(logCapture().countEqual("Received image frame: 0"), 1u);
-    EXPECT_EQ(logCapture().countEqual("Received image frame: 2"), 1u);
-    EXPECT_EQ(logCapture().countEqual("Disjoint image (frame number: 0 -> 2)\n\n"), 1u);
+    for (const char* line : {"Received input report (type 0, reportID 7, reportLength 2, timestampMach 7)",
+                             "Invalid input report with ID 7", "Invalid input report len==0",
+                             "Firmware event probe; event: 5, context: 102030405060708", "HID events probe: 1 event(s)",
+                             "Dispatch 1 event(s) takeoff", "Dispatch 1 event(s) land", "Received image frame: 0",
+                             "Received image frame: 2", "Disjoint image (frame number: 0 -> 2)\n\n"}) {
+        EXPECT_EQ(logCapture().countEqual(line), 1u) << line;
+    }
 }
 
 TEST_F(ServiceThread, ARefusedRealtimePolicyIsLoggedAndTheThreadRunsOn) {
@@ -167,44 +161,53 @@ TEST_F(ServiceThread, ARefusedRealtimePolicyIsLoggedAndTheThreadRunsOn) {
               expectedStatus != 0 ? 1u : 0u);
 }
 
-TEST_F(ServiceThread, WithoutDeviceNoThreadStarts) {
-    ASSERT_EQ(service->stop(), kZeltoSuccess);
-    const long references = queue.use_count();
-    service->setEventCallback(EventCollector::callback, &collector, nullptr);
-    service->scheduleWithDispatchQueue(queue);
-    EXPECT_EQ(threadCount(), baselineThreads);
-    EXPECT_EQ(logCapture().countContaining("no device"), 1u);
-    service->unscheduleWithDispatchQueue(queue);
-    EXPECT_EQ(queue.use_count(), references) << "the stored queue is let go";
-}
-
-TEST_F(ServiceThread, WithoutCallbackEventsAreDropped) {
-    service->scheduleWithDispatchQueue(queue);
-    ASSERT_TRUE(registered.device->waitUntilScheduled());
-    deliverAll(reportsOfScript(kTapScript));
-    EXPECT_GT(logCapture().countContaining("Dispatch event: "), 0u);
-    EXPECT_TRUE(collector.deliveries().empty());
-}
-
-TEST_F(ServiceThread, SchedulingTwiceReplacesTheThread) {
-    schedule();
-    auto secondQueue = Platform::DispatchQueue::create("second host queue");
-    EventCollector secondCollector(secondQueue);
-    const long references = secondQueue.use_count();
-    service->setEventCallback(EventCollector::callback, &secondCollector, nullptr);
-    service->scheduleWithDispatchQueue(secondQueue);
-    ASSERT_TRUE(registered.device->waitUntilScheduled());
-    EXPECT_EQ(threadCount(), baselineThreads + 2) << "one input report thread and the second queue";
-    EXPECT_EQ(logCapture().countEqual("input report thread end"), 1u);
-
-    for (const Bytes& report : reportsOfScript(kTapScript)) ASSERT_TRUE(registered.device->deliver(report));
-    secondQueue->barrier();
+TEST_F(ServiceThread, TwoHundredScheduleCyclesWithReportsFlowing) {
+    const auto reports = reportsOfScript(kTapScript);
+    std::atomic<uint64_t> posted{0};
+    {
+        std::jthread feeder([&](std::stop_token stop) {
+            for (size_t i = 0; !stop.stop_requested(); ++i) {
+                if (registered.device->post(reports[i % reports.size()])) ++posted;
+                std::this_thread::sleep_for(std::chrono::microseconds(200));
+            }
+        });
+        for (int cycle = 0; cycle < 200; ++cycle) {
+            service->scheduleWithDispatchQueue(queue);
+            if (cycle % 2 == 0) std::this_thread::sleep_for(std::chrono::microseconds(500));
+            service->unscheduleWithDispatchQueue(queue);
+            ASSERT_EQ(inspector.installedProbeCount(), 0) << "cycle " << cycle;
+        }
+    }
+    EXPECT_GT(posted.load(), 0u);
     queue->barrier();
-    EXPECT_TRUE(collector.deliveries().empty());
-    EXPECT_FALSE(secondCollector.deliveries().empty());
-    EXPECT_TRUE(secondCollector.deliveries().front().onQueue);
-    service->unscheduleWithDispatchQueue(secondQueue);
-    EXPECT_EQ(secondQueue.use_count(), references);
+    EXPECT_EQ(threadCount(), baselineThreads);
+    EXPECT_EQ(logCapture().countEqual("input report thread start"), 200u);
+    EXPECT_EQ(logCapture().countEqual("input report thread exited"), 200u);
+}
+
+// A live session, property writes included, reaches the host's queue in order and replays from
+// its recording into the very same events: the recording is complete and in order.
+TEST_F(ServiceThread, ALiveSessionReachesTheHostAndReplaysFromItsRecordingIntoTheSameEvents) {
+    schedule();
+    const auto first =
+        reportsOfScript("idle 100ms\ntap play-pause 120ms\nidle 500ms\nhold volume-up 900ms\nidle 500ms\n");
+    deliverAll(first);
+    for (const auto& [key, value] : {std::pair{"EnableTapSuppression", PropertyValue::fromBool(false)},
+                                     {"HoldTimeoutMilliseconds", PropertyValue::fromUInt32(300)}}) {
+        ASSERT_TRUE(service->setProperty(value, PropertyValue::string(std::string("Pipeline.Algs.") + key)));
+    }
+    deliverAll(reportsOfScript("tap volume-down 120ms\nidle 500ms\nbrush volume-up 250ms\nidle 500ms\n"
+                               "hold play-pause 700ms\nidle 400ms\ntap volume-up 120ms\nidle 500ms\n",
+                               static_cast<uint32_t>(first.size() * 10)));
+
+    PipelineRecording recording(service->getPropertyForKey(PropertyValue::string("Recording")));
+    EventTrace replay;
+    recording.pipeline = replay.pipeline;
+    recording.playReset();
+    while (recording.playCanContinue()) recording.playNextFrame(1e9f);
+    ASSERT_GE(replay.events.size(), 8u) << "a session with several gestures";
+    EXPECT_EQ(collector.events(), replay.events);
+    EXPECT_EQ(logCapture().countContaining("Dispatch event: "), replay.events.size());
 }
 
 }  // namespace
