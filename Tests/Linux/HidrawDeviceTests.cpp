@@ -1,4 +1,5 @@
-#include <gmock/gmock.h>
+// Linux device access over stand-ins: a SOCK_SEQPACKET socket pair for a hidraw node (one message
+// per read, as hidraw gives one report per read) and a sysfs tree in a temporary folder.
 #include <gtest/gtest.h>
 
 #include <atomic>
@@ -10,21 +11,19 @@
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <unistd.h>
-#include <vector>
+#include <utility>
 
 #include "Platform/CaptureLogSink.h"
 #include "Platform/HidrawDevice.h"
+#include "Platform/HidrawDiscovery.h"
 #include "Platform/TimerSource.h"
 #include "Shared/Util/HostClock.h"
+#include "Tests/Tools/ToolsTestSupport.h"
 
 namespace ZeltoTouch::Platform {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-
 const std::string kMode = "HidrawTestMode";
-const HidrawIdentity kIdentity{BUS_USB, 0x5A54, 0x0001, "Zelto Touch Sensor", "usb-0000:00:14.0-2/input0", ""};
 
 // Every reading is one tick later than the one before: arrival times are told apart by order.
 class TickingClock final : public Util::HostClock {
@@ -39,20 +38,20 @@ private:
 
 struct ReceivedReport {
     ZeltoReturn result;
-    uint32_t reportID;
     std::vector<uint8_t> bytes;
     uint64_t timestamp;
 };
 
-// A HidrawDevice over one end of a SOCK_SEQPACKET socket pair, which delivers one message per
-// read just as a hidraw node delivers one report; the test writes reports into the other end.
+// A HidrawDevice over one end of the socket pair; the test writes reports into the other end.
 class HidrawReportLoop : public ::testing::Test {
 protected:
     void SetUp() override {
         int fds[2];
         ASSERT_EQ(::socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0, fds), 0);
         _peer = fds[1];
-        _device = std::make_unique<HidrawDevice>(fds[0], "/dev/hidraw-test", kIdentity);
+        _device = std::make_unique<HidrawDevice>(
+            fds[0], "/dev/hidraw-test",
+            HidrawIdentity{BUS_USB, 0x5A54, 0x0001, "Zelto Touch Sensor", "usb-0000:00:14.0-2/input0", ""});
         Util::setHostClock(&_clock);
         Log::setSink(&_log);
     }
@@ -69,13 +68,8 @@ protected:
         _device->scheduleWithRunLoop(RunLoop::current(), kMode);
     }
 
-    void send(std::vector<uint8_t> report) {
+    void send(const std::vector<uint8_t>& report) {
         ASSERT_EQ(::send(_peer, report.data(), report.size(), 0), static_cast<ssize_t>(report.size()));
-    }
-
-    void closePeer() {
-        ::close(_peer);
-        _peer = -1;
     }
 
     // Runs the current run loop until done() holds, looking every millisecond; fails after 5 s.
@@ -91,6 +85,10 @@ protected:
         RunLoop::current()->runInMode(kMode);
         ASSERT_FALSE(timedOut) << "the run loop never got there";
     }
+    void runUntilThePeerHasNothingQueued() {
+        int pending = 0;
+        runUntil([&] { return ::ioctl(_peer, SIOCOUTQ, &pending) == 0 && pending == 0; });
+    }
 
     static void received(void* context, ZeltoReturn result, void* sender, uint32_t reportType, uint32_t reportID,
                          uint8_t* report, uint64_t length, uint64_t timestamp) {
@@ -98,7 +96,8 @@ protected:
         EXPECT_EQ(sender, self._device.get());
         EXPECT_EQ(reportType, kHIDReportTypeInput);
         EXPECT_EQ(report, self._buffer.data());
-        self._reports.push_back({result, reportID, std::vector<uint8_t>(report, report + length), timestamp});
+        EXPECT_EQ(reportID, report[0]);
+        self._reports.push_back({result, std::vector<uint8_t>(report, report + length), timestamp});
     }
 
     TickingClock _clock;
@@ -109,85 +108,47 @@ protected:
     std::vector<ReceivedReport> _reports;
 };
 
-TEST_F(HidrawReportLoop, DeliversEachMessageAsOneReportStampedOnArrival) {
-    ASSERT_EQ(_device->open(0), kZeltoSuccess);
-    listen(512);
-    std::vector<uint8_t> image(73, 0x11);
-    image[0] = 1;
-    send(image);
-    send({2, 0, 1, 2, 3, 4, 5, 6, 7, 8});
-    send({9, 0xAB});
-    runUntil([&] { return _reports.size() == 3; });
-
-    ASSERT_EQ(_reports.size(), 3u);
-    EXPECT_EQ(_reports[0].bytes, image);
-    EXPECT_EQ(_reports[1].bytes, (std::vector<uint8_t>{2, 0, 1, 2, 3, 4, 5, 6, 7, 8}));
-    EXPECT_EQ(_reports[2].bytes, (std::vector<uint8_t>{9, 0xAB}));
-    for (size_t i = 0; i < _reports.size(); ++i) {
-        EXPECT_EQ(_reports[i].result, kZeltoSuccess);
-        EXPECT_EQ(_reports[i].reportID, _reports[i].bytes[0]);
-    }
-    EXPECT_GT(_reports[0].timestamp, 1000u);
-    EXPECT_LT(_reports[0].timestamp, _reports[1].timestamp);
-    EXPECT_LT(_reports[1].timestamp, _reports[2].timestamp);
-    EXPECT_FALSE(_device->isDisconnected());
-}
-
-TEST_F(HidrawReportLoop, AReportLongerThanTheBufferArrivesCutAndFlagged) {
-    ASSERT_EQ(_device->open(0), kZeltoSuccess);
-    listen(8);
-    std::vector<uint8_t> image(73, 0x22);
-    image[0] = 1;
-    send(image);
-    send({2, 3});
-    runUntil([&] { return _reports.size() == 2; });
-    ASSERT_EQ(_reports.size(), 2u);
-    EXPECT_EQ(_reports[0].result, EMSGSIZE);
-    EXPECT_EQ(_reports[0].bytes, std::vector<uint8_t>(image.begin(), image.begin() + 8));
-    EXPECT_EQ(_reports[1].result, kZeltoSuccess);
-    EXPECT_EQ(_reports[1].bytes, (std::vector<uint8_t>{2, 3}));
-}
-
-TEST_F(HidrawReportLoop, ReportsArrivingWhileClosedAreReadAndDropped) {
-    listen(512);
-    send({1, 1});
-    send({1, 2});
-    int pending = 0;
-    runUntil([&] { return ::ioctl(_peer, SIOCOUTQ, &pending) == 0 && pending == 0; });  // both consumed
+TEST_F(HidrawReportLoop, DeliversEachMessageOnlyWhileOpenAsOneReportStampedOnArrivalAndCutOnlyWhenTooLong) {
+    listen(73);
+    send({1, 1});  // while closed: read and dropped
+    runUntilThePeerHasNothingQueued();
     EXPECT_TRUE(_reports.empty());
 
     ASSERT_EQ(_device->open(0), kZeltoSuccess);
-    send({1, 3});
-    runUntil([&] { return !_reports.empty(); });
-    ASSERT_EQ(_reports.size(), 1u);
-    EXPECT_EQ(_reports[0].bytes, (std::vector<uint8_t>{1, 3}));
+    std::vector<uint8_t> image(73, 0x11), tooLong(80, 0x22);
+    image[0] = tooLong[0] = 1;
+    const std::vector<std::vector<uint8_t>> sent = {image, {2, 0, 1, 2, 3, 4, 5, 6, 7, 8}, tooLong, {9, 0xAB}};
+    for (const auto& report : sent) send(report);
+    runUntil([&] { return _reports.size() == sent.size(); });
+    ASSERT_EQ(_reports.size(), sent.size());
+    for (size_t i = 0; i < sent.size(); ++i) {
+        const bool cut = i == 2;
+        EXPECT_EQ(_reports[i].result, cut ? EMSGSIZE : kZeltoSuccess) << i;
+        EXPECT_EQ(_reports[i].bytes, cut ? std::vector<uint8_t>(tooLong.begin(), tooLong.begin() + 73) : sent[i]) << i;
+        EXPECT_GT(_reports[i].timestamp, i == 0 ? 1000u : _reports[i - 1].timestamp) << i;
+    }
+    EXPECT_FALSE(_device->isDisconnected());
 
     _device->close(0);
     _device->registerInputReportCallback(nullptr, 0, nullptr, nullptr);
     ASSERT_EQ(_device->open(0), kZeltoSuccess);
     send({1, 4});  // no callback registered any more
-    runUntil([&] { return ::ioctl(_peer, SIOCOUTQ, &pending) == 0 && pending == 0; });
-    EXPECT_EQ(_reports.size(), 1u);
+    runUntilThePeerHasNothingQueued();
+    EXPECT_EQ(_reports.size(), sent.size());
 }
 
 TEST_F(HidrawReportLoop, APeerThatDisappearsEndsTheReadingCleanly) {
     ASSERT_EQ(_device->open(0), kZeltoSuccess);
-    int lostError = 0;
-    int handlerCalls = 0;
-    _device->setDisconnectHandler([&](int error) {
-        lostError = error;
-        ++handlerCalls;
-    });
+    std::vector<int> lostErrors;
+    _device->setDisconnectHandler([&](int error) { lostErrors.push_back(error); });
     listen(512);
     send({1, 1});
     send({1, 2});
-    closePeer();
-    runUntil([&] { return handlerCalls > 0; });
+    ::close(std::exchange(_peer, -1));
+    runUntil([&] { return !lostErrors.empty(); });
 
     ASSERT_EQ(_reports.size(), 2u);  // everything sent before the end still arrives, in order
     EXPECT_EQ(_reports[1].bytes, (std::vector<uint8_t>{1, 2}));
-    EXPECT_EQ(handlerCalls, 1);
-    EXPECT_EQ(lostError, ENODEV);
     EXPECT_TRUE(_device->isDisconnected());
     EXPECT_EQ(_log.countContaining("Lost /dev/hidraw-test: No such device; no more reports will be read"), 1u);
     EXPECT_EQ(_log.countAtLevel(LogLevel::Error), 1u);
@@ -197,27 +158,22 @@ TEST_F(HidrawReportLoop, APeerThatDisappearsEndsTheReadingCleanly) {
     _device->unscheduleFromRunLoop(RunLoop::current(), kMode);
     _device->scheduleWithRunLoop(RunLoop::current(), kMode);
     _device->unscheduleFromRunLoop(RunLoop::current(), kMode);
-    EXPECT_EQ(handlerCalls, 1);
+    EXPECT_EQ(lostErrors, std::vector<int>{ENODEV});
 }
 
-TEST_F(HidrawReportLoop, AFeatureReportTheDescriptorRejectsGivesTheErrnoAsStatus) {
+TEST_F(HidrawReportLoop, FeatureReportsGiveTheErrnoAsStatusAndPropertiesComeFromTheKernelsIdentity) {
     uint8_t buffer[128];
     uint64_t length = sizeof buffer;
-    const ZeltoReturn status = _device->getReport(kHIDReportTypeFeature, 0x04, buffer, length);
-    EXPECT_EQ(status, ENOTTY);  // a socket knows no hidraw ioctl
+    EXPECT_EQ(_device->getReport(kHIDReportTypeFeature, 0x04, buffer, length), ENOTTY);  // a socket knows no hidraw ioctl
     EXPECT_EQ(length, 0u);
+    const auto status = [&](HIDReportType type, uint32_t reportID, uint8_t* into, uint64_t size) {
+        return _device->getReport(type, reportID, into, size);
+    };
+    EXPECT_EQ(status(kHIDReportTypeInput, 0x04, buffer, sizeof buffer), kZeltoUnsupported);
+    EXPECT_EQ(status(kHIDReportTypeFeature, 0x04, nullptr, sizeof buffer), EINVAL);
+    EXPECT_EQ(status(kHIDReportTypeFeature, 0x04, buffer, 0), EINVAL);
+    EXPECT_EQ(status(kHIDReportTypeFeature, 0x100, buffer, sizeof buffer), EINVAL);
 
-    length = sizeof buffer;
-    EXPECT_EQ(_device->getReport(kHIDReportTypeInput, 0x04, buffer, length), kZeltoUnsupported);
-    length = sizeof buffer;
-    EXPECT_EQ(_device->getReport(kHIDReportTypeFeature, 0x04, nullptr, length), EINVAL);
-    length = 0;
-    EXPECT_EQ(_device->getReport(kHIDReportTypeFeature, 0x04, buffer, length), EINVAL);
-    length = sizeof buffer;
-    EXPECT_EQ(_device->getReport(kHIDReportTypeFeature, 0x100, buffer, length), EINVAL);
-}
-
-TEST_F(HidrawReportLoop, PropertiesComeFromTheKernelsIdentityAndCannotBeWritten) {
     EXPECT_EQ(_device->copyProperty("Product").stringView(), "Zelto Touch Sensor");
     EXPECT_EQ(_device->copyProperty("VendorID").toUInt64(), 0x5A54u);
     EXPECT_EQ(_device->copyProperty("ProductID").toUInt64(), 0x0001u);
@@ -225,50 +181,79 @@ TEST_F(HidrawReportLoop, PropertiesComeFromTheKernelsIdentityAndCannotBeWritten)
     EXPECT_EQ(_device->copyProperty("PhysicalPath").stringView(), "usb-0000:00:14.0-2/input0");
     EXPECT_EQ(_device->copyProperty("DevicePath").stringView(), "/dev/hidraw-test");
     EXPECT_FALSE(_device->copyProperty("SerialNumber").hasValue());  // the kernel has none
-    EXPECT_FALSE(_device->copyProperty("Version").hasValue());
     EXPECT_FALSE(_device->setProperty("Version", PropertyValue::fromInt32(1)));
     EXPECT_FALSE(_device->copyProperty("Version").hasValue());
 }
 
-TEST(HidrawOpen, FailuresSayWhatIsWrong) {
-    struct Case {
-        const char* path;
-        const char* expected;
-    };
-    const Case cases[] = {
-        {"/dev/hidraw-missing-for-test",
-         "/dev/hidraw-missing-for-test does not exist: is the sensor plugged in? (`zelto-touch devices` lists the "
-         "hidraw nodes)"},
-        {"/dev/null", "/dev/null is not a hidraw device"},
-        {"/", "Cannot open /: Is a directory"},
-    };
-    for (const auto& entry : cases) {
-        try {
-            HidrawDevice::openNode(entry.path);
-            ADD_FAILURE() << "opened " << entry.path;
-        } catch (const HidrawOpenError& error) {
-            EXPECT_STREQ(error.what(), entry.expected);
-        }
+std::string openFailure(const std::string& path) {
+    try {
+        HidrawDevice::openNode(path);
+    } catch (const HidrawOpenError& error) {
+        return error.what();
     }
+    return "opened " + path;
+}
+
+TEST(HidrawOpen, FailuresSayWhatIsWrong) {
+    EXPECT_EQ(openFailure("/dev/null"), "/dev/null is not a hidraw device");
+    EXPECT_EQ(openFailure("/"), "Cannot open /: Is a directory");
 }
 
 TEST(HidrawOpen, PermissionDeniedPointsAtTheUdevRule) {
     if (::geteuid() == 0) GTEST_SKIP() << "root may open anything";
-    char path[] = "/tmp/zelto-hidraw-denied-XXXXXX";
-    const int fd = ::mkstemp(path);
-    ASSERT_GE(fd, 0);
-    ::fchmod(fd, 0);
-    ::close(fd);
-    try {
-        HidrawDevice::openNode(path);
-        ADD_FAILURE() << "opened " << path;
-    } catch (const HidrawOpenError& error) {
-        EXPECT_EQ(std::string(error.what()),
-                  std::string("Permission denied opening ") + path +
-                      ": install the udev rule 70-zelto-touch.rules (it gives the zelto-touch group access to the "
-                      "sensor), then add your user to that group or run as root");
+    const Testing::TemporaryDirectory folder;
+    const std::string path = folder.write("hidraw", "");
+    ::chmod(path.c_str(), 0);
+    EXPECT_EQ(openFailure(path), "Permission denied opening " + path +
+                                     ": install the udev rule 70-zelto-touch.rules (it gives the zelto-touch group "
+                                     "access to the sensor), then add your user to that group or run as root");
+}
+
+TEST(HidrawDiscovery, ListsNodesInNumberOrderWithTheirIdentity) {
+    const Testing::TemporaryDirectory sysfs;
+    EXPECT_TRUE(listHidrawNodes(sysfs.path(), "/dev").empty());  // no hidraw class: no driver loaded
+    const auto addNode = [&](const std::string& name, const std::string& uevent) {
+        sysfs.write("class/hidraw/" + name + "/device/uevent", uevent);
+    };
+    addNode("hidraw10", "DRIVER=hid-generic\nHID_ID=0005:0000046D:0000B33E\nHID_NAME=Keyboard K\n");
+    addNode("hidraw2", "HID_ID=0003:00005A54:00000001\nHID_NAME=Zelto Touch Sensor\nHID_PHYS=usb-0000:00:14.0-2/input0\n"
+                       "HID_UNIQ=ZT-000123\nMODALIAS=hid:b0003g0001v00005A54p00000001\n");
+    addNode("hidraw0", "HID_ID=0018:000004F3:00003057\nHID_NAME=Touchpad = with equals\n");
+    std::filesystem::create_directories(sysfs.path("class/hidraw/hidraw1"));  // no uevent to read
+    addNode("hidraw3", "HID_ID=0003:00005A54:00000001\n");
+
+    const auto nodes = listHidrawNodes(sysfs.path(), "/dev");
+    ASSERT_EQ(nodes.size(), 5u);
+    EXPECT_EQ(nodes[4].name, "hidraw10");
+    EXPECT_EQ(nodes[2].identity,
+              (HidrawIdentity{BUS_USB, 0x5A54, 0x0001, "Zelto Touch Sensor", "usb-0000:00:14.0-2/input0", "ZT-000123"}));
+    EXPECT_EQ(nodes[2].devicePath, "/dev/hidraw2");
+    EXPECT_EQ(nodes[0].identity.name, "Touchpad = with equals");
+    EXPECT_EQ(nodes[0].identity.transportName(), "I2C");
+    EXPECT_EQ(nodes[1].identity, HidrawIdentity{});
+    const auto matching = nodesMatching(nodes, kZeltoSensorID);
+    ASSERT_EQ(matching.size(), 2u);
+    EXPECT_EQ(matching[0].name + " " + matching[1].name, "hidraw2 hidraw3");
+}
+
+TEST(HidrawDiscovery, UeventParsingTakesTheFieldsItKnowsAndRefusesMalformedIds) {
+    const auto identity = parseHidUevent("HID_ID=0003:0000abcd:0000EF01\nHID_NAME=\nHID_UNIQ=x\nNOEQUALS\n");
+    EXPECT_EQ(identity, (HidrawIdentity{BUS_USB, 0xABCD, 0xEF01, "", "", "x"}));
+    for (const char* malformed : {"HID_ID=0003:00005A54", "HID_ID=0003::00000001", "HID_ID=xyz:1:2",
+                                  "HID_ID=0003:000000005A54:1"}) {
+        EXPECT_EQ(parseHidUevent(malformed), HidrawIdentity{}) << malformed;
     }
-    ::unlink(path);
+    EXPECT_EQ(parseHidUevent("HID_ID=garbage\nHID_NAME=Odd\n"), (HidrawIdentity{0, 0, 0, "Odd", "", ""}));
+}
+
+TEST(HidrawDiscovery, VendorProductIsAHexPairAndNothingElse) {
+    EXPECT_EQ(parseVendorProduct("5a54:0001"), kZeltoSensorID);
+    EXPECT_EQ(parseVendorProduct("5A54:1"), kZeltoSensorID);
+    for (const char* bad : {"", ":", "5a54", "5a54:", ":0001", "5a54:00001", "0x5a54:0001", "5a54:000g", "5a54:0001:2",
+                            "-1:0001", "5a54 :0001"}) {
+        EXPECT_FALSE(parseVendorProduct(bad)) << bad;
+    }
+    EXPECT_EQ(formatVendorProduct(kZeltoSensorID), "5a54:0001");
 }
 
 }  // namespace

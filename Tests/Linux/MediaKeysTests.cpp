@@ -1,6 +1,11 @@
 #include <gtest/gtest.h>
 
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include "Platform/MediaKeys.h"
+#include "Tests/Tools/ToolsTestSupport.h"
+#include "Tools/UinputKeySender.h"
 
 namespace ZeltoTouch::Platform {
 namespace {
@@ -20,16 +25,13 @@ const KeyCommand kStop{KeyAction::StopRepeating, 0};
 KeyCommand press(unsigned key) { return {KeyAction::Press, key}; }
 KeyCommand repeat(unsigned key) { return {KeyAction::PressAndRepeat, key}; }
 
-struct MappingRow {
-    const char* gesture;
-    uint32_t mask;
-    uint32_t phase;
-    double region;
-    KeyCommand expected;
-};
-
 TEST(MediaKeys, MapsEveryGestureAndRegion) {
-    const MappingRow rows[] = {
+    const struct {
+        const char* gesture;
+        uint32_t mask, phase;
+        double region;
+        KeyCommand expected;
+    } rows[] = {
         {"tap play/pause", kTap, 0, 1, press(KEY_PLAYPAUSE)},
         {"tap volume down", kTap, 0, 2, press(KEY_VOLUMEDOWN)},
         {"tap volume up", kTap, 0, 3, press(KEY_VOLUMEUP)},
@@ -52,13 +54,10 @@ TEST(MediaKeys, MapsEveryGestureAndRegion) {
         EXPECT_EQ(keyCommandForEvent(*digitizerEvent(row.mask, row.phase, row.region), kHoldKey), row.expected)
             << row.gesture;
     }
-}
-
-TEST(MediaKeys, TheHoldKeyIsConfigurableAndOnlyEventsOfTheDigitizerCount) {
+    // The hold key is configurable, and only the digitizer's events count.
     EXPECT_EQ(keyCommandForEvent(*digitizerEvent(kHold, 1, 1), KEY_MUTE), press(KEY_MUTE));
     EXPECT_EQ(keyCommandForEvent(*digitizerEvent(kHold, 1, 1)), press(KEY_VOICECOMMAND));
-    const auto reset = HIDEvent::createVendorDefinedEvent(0, 0xFF60, 2, 0, nullptr, 0, 0);
-    EXPECT_EQ(keyCommandForEvent(*reset), kNothing);
+    EXPECT_EQ(keyCommandForEvent(*HIDEvent::createVendorDefinedEvent(0, 0xFF60, 2, 0, nullptr, 0, 0)), kNothing);
 }
 
 TEST(KeyRepeatSchedule, RepeatsAtASteadyRateUntilStopped) {
@@ -90,6 +89,42 @@ TEST(KeyRepeatSchedule, AHoldChangeSwitchesTheKeyAndRestartsTheRate) {
     EXPECT_EQ(schedule.apply(repeat(KEY_VOLUMEUP), start + 150ms), std::vector<unsigned>{KEY_VOLUMEUP});
     EXPECT_FALSE(schedule.keyDue(start + 200ms));
     EXPECT_EQ(schedule.keyDue(start + 350ms), KEY_VOLUMEUP);
+}
+
+std::string keyboardFailure(const std::string& uinputPath) {
+    try {
+        const unsigned keys[] = {KEY_PLAYPAUSE, KEY_VOLUMEUP};
+        Tools::UinputKeySender sender(keys, uinputPath);
+    } catch (const std::runtime_error& error) {
+        return error.what();
+    }
+    return "made a keyboard";
+}
+
+TEST(UinputKeySender, SomethingThatIsNotUinputRefusesTheKeyboard) {
+    const Testing::TemporaryDirectory folder;
+    const std::string notUinput = folder.write("not-uinput", "");
+    EXPECT_EQ(keyboardFailure(notUinput),
+              "Cannot create a virtual keyboard through " + notUinput + ": Inappropriate ioctl for device");
+}
+
+TEST(UinputKeySender, AnUnwritableUinputDeviceSaysHowToGetAccess) {
+    if (::geteuid() == 0) GTEST_SKIP() << "root may write anything";
+    const Testing::TemporaryDirectory folder;
+    const std::string path = folder.write("readonly-uinput", "");
+    ::chmod(path.c_str(), 0444);
+    EXPECT_EQ(keyboardFailure(path), path + " is not writable: the udev rule 70-zelto-touch.rules gives the zelto-touch "
+                                            "group write access; add your user to that group or run as root");
+}
+
+TEST(UinputKeySender, KeysAreNamedByNameOrNumber) {
+    EXPECT_EQ(Tools::keyCodeFromName("KEY_VOICECOMMAND"), KEY_VOICECOMMAND);
+    EXPECT_EQ(Tools::keyCodeFromName("KEY_MUTE"), KEY_MUTE);
+    EXPECT_EQ(Tools::keyCodeFromName("164"), KEY_PLAYPAUSE);
+    for (const char* bad : {"", "KEY_NOPE", "key_mute", "0", "99999", "REL_X", "12abc"}) {
+        EXPECT_FALSE(Tools::keyCodeFromName(bad)) << bad;
+    }
+    EXPECT_EQ(Tools::keyName(KEY_VOLUMEUP), "KEY_VOLUMEUP");
 }
 
 }  // namespace

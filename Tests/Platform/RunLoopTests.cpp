@@ -1,12 +1,15 @@
+// Run loops with their sources, dispatch queues and threads.
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <cerrno>
+#include <numeric>
 #include <thread>
-#include <unistd.h>
 
-#include "Platform/FileDescriptorSource.h"
+#include "Platform/DispatchQueue.h"
 #include "Platform/RunLoop.h"
 #include "Platform/Semaphore.h"
+#include "Platform/Thread.h"
 #include "Platform/TimerSource.h"
 
 namespace ZeltoTouch::Platform {
@@ -15,63 +18,54 @@ namespace {
 using namespace std::chrono_literals;
 const std::string kMode = "kHandleInputReportsRunLoopMode";
 
-// A thread that runs its run loop in kMode until stopped, the way the service's input thread does.
-class RunLoopThread {
-public:
-    explicit RunLoopThread(std::function<void(const std::shared_ptr<RunLoop>&)> beforeRun = {}) {
-        _thread = std::thread([this, beforeRun] {
-            auto runLoop = RunLoop::current();
-            _runLoop = runLoop;
-            if (beforeRun) beforeRun(runLoop);
-            _published.signal();
-            runLoop->runInMode(kMode);
-            _finished.signal();
+TEST(RunLoop, AStopCalledOrQueuedBeforeTheLoopRunsIsHonoured) {
+    auto runLoop = RunLoop::current();
+    for (const bool queued : {true, false}) {
+        if (queued) {
+            runLoop->perform(kMode, [&] { runLoop->stop(); });
+        } else {
+            runLoop->stop();
+        }
+        bool timedOut = false;
+        TimerSource watchdog(2s, [&] {
+            timedOut = true;
+            runLoop->stop();
         });
-        _published.wait();
+        watchdog.attach(runLoop, kMode);
+        runLoop->runInMode(kMode);
+        EXPECT_FALSE(timedOut) << (queued ? "queued" : "called");
     }
-    ~RunLoopThread() {
-        stop();
-        _thread.join();
-    }
-    void stop() {
-        _runLoop->perform(kMode, [] { RunLoop::current()->stop(); });
-        _runLoop->wakeUp();
-    }
-    bool waitUntilFinished() { return _finished.waitFor(2s); }
-    const std::shared_ptr<RunLoop>& runLoop() const { return _runLoop; }
+}
 
-private:
-    std::shared_ptr<RunLoop> _runLoop;
-    Semaphore _published, _finished;
-    std::thread _thread;
-};
-
-TEST(RunLoop, AStopQueuedBeforeTheLoopRunsIsHonoured) {
-    Semaphore stopQueued;
-    RunLoopThread thread([&](const std::shared_ptr<RunLoop>& runLoop) {
-        runLoop->perform(kMode, [] { RunLoop::current()->stop(); });  // before runInMode
+// The loop runs on a thread of its own, the way the service's input thread does.
+TEST(RunLoop, TasksFromAnotherThreadRunInOrderOnTheLoopsThreadWhichAWakeUpKeepsRunning) {
+    std::shared_ptr<RunLoop> runLoop;
+    Semaphore published, finished, done;
+    std::thread thread([&] {
+        runLoop = RunLoop::current();
+        published.signal();
+        RunLoop::current()->runInMode(kMode);
+        finished.signal();
     });
-    EXPECT_TRUE(thread.waitUntilFinished());
-}
-
-TEST(RunLoop, AStopCalledBeforeTheLoopRunsIsHonoured) {
-    RunLoopThread thread([](const std::shared_ptr<RunLoop>& runLoop) { runLoop->stop(); });
-    EXPECT_TRUE(thread.waitUntilFinished());
-}
-
-TEST(RunLoop, TasksRunInOrderOnTheLoopsThread) {
-    RunLoopThread thread;
+    published.wait();
     std::vector<int> order;
     std::thread::id taskThread;
-    Semaphore done;
-    for (int i = 0; i < 5; ++i) thread.runLoop()->perform(kMode, [&, i] { order.push_back(i); });
-    thread.runLoop()->perform(kMode, [&] {
+    for (int i = 0; i < 5; ++i) runLoop->perform(kMode, [&, i] { order.push_back(i); });
+    runLoop->perform(kMode, [&] {
         taskThread = std::this_thread::get_id();
         done.signal();
     });
     ASSERT_TRUE(done.waitFor(2s));
     EXPECT_EQ(order, (std::vector<int>{0, 1, 2, 3, 4}));
-    EXPECT_NE(taskThread, std::this_thread::get_id());
+    EXPECT_EQ(taskThread, thread.get_id());
+
+    runLoop->wakeUp();
+    EXPECT_TRUE(runLoop->isRunning());
+    runLoop->perform(kMode, [] { RunLoop::current()->stop(); });
+    runLoop->wakeUp();
+    EXPECT_TRUE(finished.waitFor(2s));
+    thread.join();
+    EXPECT_FALSE(runLoop->isRunning());
 }
 
 TEST(RunLoop, TasksForAnotherModeWaitUntilTheLoopRunsInIt) {
@@ -95,22 +89,17 @@ TEST(RunLoop, TasksForAnotherModeWaitUntilTheLoopRunsInIt) {
     EXPECT_EQ(ran, (std::vector<std::string>{kMode, "other", "after stop"}));
 }
 
-TEST(RunLoop, WakeUpFromAnotherThreadKeepsTheLoopRunning) {
-    RunLoopThread thread;
-    thread.runLoop()->wakeUp();
-    EXPECT_TRUE(thread.runLoop()->isRunning());
-    thread.stop();
-    EXPECT_TRUE(thread.waitUntilFinished());
-    EXPECT_FALSE(thread.runLoop()->isRunning());
-}
-
-TEST(RunLoop, TimerSourceRepeatsUntilDetached) {
+TEST(RunLoop, TimerSourceRepeatsOnlyInItsModeUntilDetached) {
     auto runLoop = RunLoop::current();
     int fired = 0;
     TimerSource timer(2ms, [&] {
         if (++fired == 3) runLoop->stop();
     });
     timer.attach(runLoop, kMode);
+    TimerSource otherModeStop(20ms, [&] { runLoop->stop(); });
+    otherModeStop.attach(runLoop, "other");
+    runLoop->runInMode("other");
+    EXPECT_EQ(fired, 0);
     runLoop->runInMode(kMode);
     EXPECT_EQ(fired, 3);
     timer.detach();
@@ -119,45 +108,9 @@ TEST(RunLoop, TimerSourceRepeatsUntilDetached) {
     EXPECT_EQ(fired, 3);
 }
 
-TEST(RunLoop, TimerSourceFiresOnlyInItsMode) {
-    auto runLoop = RunLoop::current();
-    int fired = 0;
-    TimerSource timer(1ms, [&] { ++fired; });
-    timer.attach(runLoop, kMode);
-    TimerSource otherModeStop(20ms, [&] { runLoop->stop(); });
-    otherModeStop.attach(runLoop, "other");
-    runLoop->runInMode("other");
-    EXPECT_EQ(fired, 0);
-    TimerSource stopper(5ms, [&] { runLoop->stop(); });
-    stopper.attach(runLoop, kMode);
-    runLoop->runInMode(kMode);
-    EXPECT_GE(fired, 1);
-}
-
-TEST(RunLoop, FileDescriptorSourceFiresWhenReadable) {
-    int pipeEnds[2];
-    ASSERT_EQ(pipe(pipeEnds), 0);
-    auto runLoop = RunLoop::current();
-    std::string received;
-    FileDescriptorSource source(pipeEnds[0], [&] {
-        char buffer[16];
-        const ssize_t count = read(pipeEnds[0], buffer, sizeof buffer);
-        received.append(buffer, static_cast<size_t>(std::max<ssize_t>(count, 0)));
-        if (received == "ping") runLoop->stop();
-    });
-    source.attach(runLoop, kMode);
-    std::thread writer([&] { EXPECT_EQ(write(pipeEnds[1], "ping", 4), 4); });
-    runLoop->runInMode(kMode);
-    writer.join();
-    EXPECT_EQ(received, "ping");
-    source.detach();
-    close(pipeEnds[0]);
-    close(pipeEnds[1]);
-}
-
 TEST(RunLoop, ASourceMayDestroyItselfInItsCallback) {
     auto runLoop = RunLoop::current();
-    auto timer = std::make_unique<TimerSource>(1ms, [] {});
+    std::unique_ptr<TimerSource> timer;
     timer = std::make_unique<TimerSource>(1ms, [&] {
         timer.reset();
         runLoop->stop();
@@ -165,6 +118,67 @@ TEST(RunLoop, ASourceMayDestroyItselfInItsCallback) {
     timer->attach(runLoop, kMode);
     runLoop->runInMode(kMode);
     EXPECT_EQ(timer, nullptr);
+}
+
+TEST(DispatchQueue, RunsTasksInSubmissionOrderOnItsOwnThreadPastOneThatThrows) {
+    auto queue = DispatchQueue::create("test.order");
+    std::vector<int> order;
+    std::atomic<bool> onQueueThread{true};
+    for (int i = 0; i < 100; ++i) {
+        queue->async([&, i] {
+            order.push_back(i);
+            if (!queue->isCurrent()) onQueueThread = false;
+            if (i == 50) throw std::runtime_error("boom");
+        });
+    }
+    queue->barrier();
+    std::vector<int> expected(100);
+    std::iota(expected.begin(), expected.end(), 0);
+    EXPECT_EQ(order, expected);
+    EXPECT_TRUE(onQueueThread);
+
+    bool ran = false;
+    queue->sync([&] { queue->sync([&] { ran = true; }); });  // sync on the queue itself runs at once
+    EXPECT_TRUE(ran);
+    EXPECT_EQ(DispatchQueue::fromHandle(queue->handle()), queue);
+    EXPECT_EQ(DispatchQueue::fromHandle(nullptr), nullptr);
+}
+
+TEST(DispatchQueue, DestructionRunsEverySubmittedTask) {
+    std::atomic<int> ran{0};
+    {
+        auto queue = DispatchQueue::create("test.drain");
+        for (int i = 0; i < 50; ++i) queue->async([&] { ++ran; });
+    }
+    EXPECT_EQ(ran, 50);
+}
+
+TEST(DispatchQueue, TheLastReferenceMayGoAwayInsideItsOwnTask) {
+    Semaphore done;
+    auto queue = DispatchQueue::create("test.self");
+    queue->async([queue, &done]() mutable {
+        queue.reset();
+        done.signal();
+    });
+    queue.reset();  // the task now holds the last reference
+    EXPECT_TRUE(done.waitFor(2s));
+}
+
+TEST(Thread, ADetachedThreadSignalsAcrossAndReportsTheSystemsRealtimeAnswer) {
+    Semaphore semaphore;
+    EXPECT_FALSE(semaphore.waitFor(1ms));
+    std::atomic<int> result{-1}, refused{-1};
+    startDetachedThread([&] {
+        result = setRealtimeRoundRobin(63);
+        refused = setRealtimeRoundRobin(1000);  // beyond every priority range
+        semaphore.signal();
+        semaphore.signal();
+    }, "test.realtime");
+    semaphore.wait();
+    EXPECT_TRUE(semaphore.waitFor(2s));  // the semaphore counts both signals
+    EXPECT_FALSE(semaphore.waitFor(1ms));
+    EXPECT_TRUE(result == 0 || result == EPERM) << result;  // granted as root, refused otherwise
+    EXPECT_NE(refused, 0);
 }
 
 }  // namespace
