@@ -69,7 +69,6 @@ TEST_F(StandInSensor, RunPrintsTheGesturesLiveAndSavesTheRecordingOnSIGUSR1AndOn
     std::vector<EventFields> expected;
     for (const auto& [index, event] : produced) expected.push_back(fieldsOf(*event));
     reports.resize(produced.back().reportIndex + 1);
-    ASSERT_EQ(expected[1], EventFields(0, 0x20000, 1, std::get<3>(expected[1]))) << "the script should give a tap";
     const std::string recordPath = _folder.path("live.json");
 
     auto child = start({"--format", "jsonl", "--record", recordPath});
@@ -102,7 +101,6 @@ TEST_F(StandInSensor, RunPrintsTheGesturesLiveAndSavesTheRecordingOnSIGUSR1AndOn
         previousTime = line.get("t").toUInt64();
     }
     EXPECT_EQ(printed, expected);
-    EXPECT_EQ(PropertyValue::fromJSON(lines(child->out()).back()).get("event").stringView(), "hold-end");
 }
 
 TEST_F(StandInSensor, ASensorThatDisappearsEndsTheRunWithAFailureButKeepsTheRecording) {

@@ -139,12 +139,11 @@ inline ToolRun runTool(const std::vector<std::string>& arguments) { return runPr
 inline std::string chromiumPath() { return ::access("/usr/bin/chromium", X_OK) == 0 ? "/usr/bin/chromium" : ""; }
 inline ToolRun runChromium(const std::string& argument, const std::string& pagePath) {
     const TemporaryDirectory profile;
-    ToolRun run = runProgram(chromiumPath(), {"--headless", "--no-sandbox", "--disable-gpu", "--disable-quic",
-                                              "--no-first-run", "--disable-background-networking",
-                                              "--disable-component-update", "--disable-sync",
-                                              "--user-data-dir=" + profile.path(), "--window-size=1400,1300",
-                                              "--hide-scrollbars", "--virtual-time-budget=10000", argument,
-                                              "file://" + std::filesystem::absolute(pagePath).string()});
+    ToolRun run = runProgram(
+        chromiumPath(), {"--headless", "--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run",
+                         "--disable-background-networking", "--disable-component-update", "--disable-sync",
+                         "--user-data-dir=" + profile.path(), "--window-size=1400,1300", "--hide-scrollbars",
+                         "--virtual-time-budget=10000", argument, "file://" + std::filesystem::absolute(pagePath).string()});
     if (run.status != 0) throw std::runtime_error("chromium failed: " + run.err);
     return run;
 }

@@ -77,7 +77,7 @@ std::vector<Pixel> physicalPixels(const std::vector<std::pair<int, int>>& values
     return pixels;
 }
 
-TEST(VirtualImageTest, SumsMembersAboveNoiseAndFollowsStrongest) {
+TEST(VirtualImageTest, SumsMembersAboveNoiseAndFollowsStrongestKeepingThePreviousOnATie) {
     VirtualImage image;
     image.updateValues(physicalPixels({{0, 80}, {1, 120}, {4, 75}}));  // A, B, E
     EXPECT_EQ(image.values[0], 200);  // "ABE": E adds nothing
@@ -87,6 +87,8 @@ TEST(VirtualImageTest, SumsMembersAboveNoiseAndFollowsStrongest) {
     image.updateValues(physicalPixels({{0, 76}}));
     EXPECT_EQ(image.values[0], 76);
     EXPECT_EQ(image.maxPixelIndices[0], 0);
+    image.updateValues(physicalPixels({{0, 95}, {1, 95}}));  // a tie keeps the previous choice A
+    EXPECT_EQ(image.maxPixelIndices[0], 0);
 
     // All below noise: nothing sums and every choice stays.
     const std::vector<int32_t> before = image.maxPixelIndices;
@@ -94,17 +96,6 @@ TEST(VirtualImageTest, SumsMembersAboveNoiseAndFollowsStrongest) {
     EXPECT_EQ(image.values, std::vector<int32_t>(23, 0));
     EXPECT_EQ(image.maxPixelIndices, before);
     EXPECT_THROW(image.updateValues(std::vector<Pixel>(14, Pixel(0, 1.0f))), std::out_of_range);
-}
-
-TEST(VirtualImageTest, StrongestMemberTiesKeepEarlierChoice) {
-    VirtualImage image;
-    image.updateValues(physicalPixels({{6, 90}, {7, 90}}));  // "GHI"
-    EXPECT_EQ(image.values[15], 180);
-    EXPECT_EQ(image.maxPixelIndices[15], 6);
-    image.updateValues(physicalPixels({{7, 95}}));
-    EXPECT_EQ(image.maxPixelIndices[15], 7);
-    image.updateValues(physicalPixels({{6, 95}, {7, 95}}));  // previous choice H wins the tie
-    EXPECT_EQ(image.maxPixelIndices[15], 7);
 }
 
 }  // namespace

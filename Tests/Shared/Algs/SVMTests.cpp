@@ -1,7 +1,5 @@
 #include "Shared/Algs/SVM.h"
 
-#include <algorithm>
-#include <numeric>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -28,34 +26,6 @@ TEST(SVMTest, EvaluatesOnlyWithALeaderAboveThresholdOrARunnerUpAboveNoise) {
         EXPECT_EQ(score(values) != 0.0f, evaluated) << testing::PrintToString(values);
     }
     EXPECT_EQ(score({300}, 300.0f), 0.0f);
-}
-
-TEST(SVMTest, ScoreDependsOnRanksNotChannels) {
-    std::vector<int32_t> values(kChannelCount);
-    std::iota(values.begin(), values.end(), 40);
-    values[3] = 700;
-    const float reference = score(values);
-    std::reverse(values.begin(), values.end());
-    EXPECT_EQ(score(values), reference);
-    std::rotate(values.begin(), values.begin() + 11, values.end());
-    EXPECT_EQ(score(values), reference);
-}
-
-// One classifier keeps the previous frame's ranking to start from; whatever came before, a
-// frame scores as it does on a fresh classifier.
-TEST(SVMTest, ScoreDoesNotDependOnEarlierFrames) {
-    Channels channels;
-    SVM continuing;
-    for (int frame = 0; frame < 60; ++frame) {
-        for (int i = 0; i < kChannelCount; ++i) {
-            channels[i].value = (i * 37 + frame * 101) % 613 - 40 + (i == frame % kChannelCount ? 900 : 0);
-        }
-        continuing.updateSVMScore(channels.pixels, channels.virtualPixels, 200.0f, 0);
-        SVM fresh;
-        fresh.updateSVMScore(channels.pixels, channels.virtualPixels, 200.0f, 0);
-        EXPECT_NE(fresh.getSVMScore(), 0.0f) << frame;
-        EXPECT_EQ(continuing.getSVMScore(), fresh.getSVMScore()) << frame;
-    }
 }
 
 }  // namespace

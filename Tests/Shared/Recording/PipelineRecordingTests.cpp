@@ -1,11 +1,9 @@
 #include "Shared/Recording/PipelineRecording.h"
 
 #include <memory>
-#include <numeric>
 #include <string>
 #include <vector>
 
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "Tests/Shared/Recording/RecordingTestSupport.h"
@@ -78,9 +76,7 @@ TEST(Trimming, AppendingKeepsTheNewestReportsAndTheStateNeededForThem) {
 
 TEST(Trimming, SetMaxFrameCountTrimsAtOnceAndZeroRemovesTheLimit) {
     PipelineRecording recording;
-    for (int i = 0; i < 1000; ++i) appendTokens(recording, {"R1", "a=1"});
-    EXPECT_EQ(recording.frames().size(), 2000u);  // no limit by default
-    appendTokens(recording, {"R2", "R3"});
+    appendTokens(recording, {"R1", "a=1", "R1", "a=1", "R2", "R3"});  // no limit by default
     recording.setMaxFrameCount(2);
     EXPECT_EQ(tokens(recording.frames()), (Tokens{"a=1", "R2", "R3"}));
     recording.setMaxFrameCount(0);
@@ -105,86 +101,10 @@ TEST(Recording, RecordsInNanosecondsAndForwardsUnchanged) {
               (Tokens{"State 1250 Algs.Threshold={}", "InputReport 2500 01 02 03 ", "Metadata 3750 Accel={}",
                       "InputReport 5000 ", "State 6250 Gone=(no value)"}));
 
-    PropertyValue(value).set("Changed", PropertyValue::fromUInt64(1));  // values are shared, not copied
-    EXPECT_TRUE(recording.frames().front().value.get("Changed"));
-
     recording.pipeline.reset();  // without a pipeline it still records
     const Bytes longReport(100, 0xAB);  // longer than the inline storage
     recording.handleInputReport(3, longReport.data(), longReport.size());
     EXPECT_EQ(Bytes(recording.frames().back().data.begin(), recording.frames().back().data.end()), longReport);
-}
-
-TEST(CopySemantics, FramesAreDuplicatedValuesSharedCursorKeptInPlace) {
-    PipelineRecording original;
-    auto downstream = std::make_shared<CallLog>();
-    original.pipeline = downstream;
-    original.setMaxFrameCount(7);
-    const PropertyValue shared = PropertyValue::mutableDictionary();
-    for (uint64_t t : {3, 6, 9}) original.setState(t, "k" + std::to_string(t), shared);
-    original.playReset();
-    original.playNextFrame(1.0f);
-
-    PipelineRecording copy(original);
-    EXPECT_EQ(copy.maxFrameCount(), 7u);
-    EXPECT_EQ(copy.pipeline, original.pipeline);
-    copy.playNextFrame(1.0f);  // the copy's cursor stands on its own second frame
-    EXPECT_THAT(downstream->calls.back(), testing::EndsWith(" k6={}"));
-
-    original.setState(12, "k12", shared);
-    EXPECT_EQ(copy.frames().size(), 3u);
-    EXPECT_TRUE(copy.playCanContinue());  // recording into the original ends only its playback
-    EXPECT_FALSE(original.playCanContinue());
-    PropertyValue(shared).set("X", PropertyValue::fromUInt64(1));
-    EXPECT_TRUE(copy.frames().front().value.get("X"));
-
-    PipelineRecording assigned;
-    assigned = copy;
-    assigned.playNextFrame(1.0f);
-    EXPECT_THAT(downstream->calls.back(), testing::EndsWith(" k9={\"X\": 1}"));
-    EXPECT_FALSE(assigned.playCanContinue());
-    EXPECT_TRUE(copy.playCanContinue());
-}
-
-TEST(MoveSemantics, CursorFollowsAndTheMovedFromRecordingStaysUsable) {
-    PipelineRecording original;
-    original.setState(3, "a", {});
-    original.playReset();
-    PipelineRecording moved(std::move(original));
-    moved.playNextFrame(1.0f);
-    EXPECT_FALSE(moved.playCanContinue());  // the end moved along too
-    PipelineRecording target;
-    target = std::move(moved);
-    EXPECT_FALSE(target.playCanContinue());
-
-    original.setState(6, "b", {});  // NOLINT(bugprone-use-after-move): a moved-from recording is empty and usable
-    EXPECT_EQ(original.frames().size(), 1u);
-    EXPECT_FALSE(original.playCanContinue());
-}
-
-Bytes counting(size_t length) {
-    Bytes bytes(length);
-    std::iota(bytes.begin(), bytes.end(), uint8_t{7});
-    return bytes;
-}
-
-// Lengths on both sides of the inline capacity, through every way of copying and moving,
-// including an inline report replaced by a heap one and back.
-TEST(ReportBytesTest, KeepsTheBytesInlineAndOnTheHeap) {
-    for (const size_t length : {size_t{0}, size_t{1}, ReportBytes::kInlineCapacity, ReportBytes::kInlineCapacity + 1}) {
-        const Bytes bytes = counting(length);
-        const auto holds = [&](const ReportBytes& report) { return Bytes(report.begin(), report.end()) == bytes; };
-        const ReportBytes original(bytes);
-        ReportBytes copy(original);
-        ReportBytes moved(std::move(copy));
-        EXPECT_TRUE(copy.empty()) << length;
-        ReportBytes assigned(counting(200));
-        assigned = original;
-        EXPECT_TRUE(holds(assigned)) << length;
-        ReportBytes moveAssigned(counting(3));
-        moveAssigned = std::move(assigned);
-        EXPECT_TRUE(holds(original) && holds(moved) && holds(moveAssigned)) << length;
-        EXPECT_EQ(moveAssigned, original);
-    }
 }
 
 }  // namespace
