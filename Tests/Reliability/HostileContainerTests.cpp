@@ -1,12 +1,12 @@
-// Hostile recording containers: huge timestamps, deep nesting, huge arrays, invalid UTF-8 and
-// malformed structure. Each is read into a recording or refused with its documented error;
+// Hostile recording containers: huge timestamps and numbers, nesting to the limit, huge arrays.
+// Each is read into a recording or refused with its documented error;
 // whatever is read writes back into a container that reads as the same frames.
 
 #include <cmath>
 #include <cstdint>
 #include <stdexcept>
 #include <string>
-#include <vector>
+#include <span>
 
 #include <gtest/gtest.h>
 
@@ -26,8 +26,8 @@ std::string stateFrame(std::string_view timestamp, std::string_view value) {
            std::string(value) + "}";
 }
 
-std::string container(std::string_view frames, std::string_view version = "2") {
-    return std::string(R"({"Version":)") + std::string(version) + R"(,"Frames":[)" + std::string(frames) + "]}";
+std::string container(std::string_view frames) {
+    return std::string(R"({"Version":2,"Frames":[)") + std::string(frames) + "]}";
 }
 
 // Reads the text (into read, if given); a recording must survive its own writer. Returns the
@@ -51,12 +51,9 @@ std::string outcome(std::string_view text, PipelineRecording* read = nullptr) {
 constexpr const char* kRefused = "runtime: migrateSerializedContainer failed: invalid container";
 
 TEST(HostileContainers, Timestamps) {
+    // Numbers the JSON reader takes or refuses are covered with its own tests.
     const std::pair<const char*, const char*> cases[] = {
-        {"18446744073709551615", ""}, {"-1", ""}, {"-9223372036854775808", ""}, {"1.5", ""}, {"1e308", ""},
-        {"18446744073709551616", ""},  // beyond 64 bits: a double, read as a number
-        {"1e400", kRefused},           // beyond double: not JSON the parser takes
-        {"NaN", kRefused},
-        {"\"5\"", "invalid-argument: invalid frame timestamp"},
+        {"18446744073709551615", ""}, {"-1", ""}, {"1.5", ""}, {"1e308", ""}, {"18446744073709551616", ""},
         {"null", "invalid-argument: invalid frame timestamp"},
     };
     for (const auto& [timestamp, expected] : cases) {
@@ -84,13 +81,10 @@ TEST(HostileContainers, NumbersReadExactlyOrRefused) {
     }
 }
 
-TEST(HostileContainers, DeepNesting) {
-    // The container itself takes three levels (object, array, frame object).
-    const size_t allowed = PropertyValue::kMaxJSONDepth - 3;
+TEST(HostileContainers, NestingUpToTheLimitCountsTheContainersOwnLevels) {
+    const size_t allowed = PropertyValue::kMaxJSONDepth - 3;  // object, array, frame object
     EXPECT_EQ(outcome(container(stateFrame("1", repeat("[", allowed) + repeat("]", allowed)))), "");
     EXPECT_EQ(outcome(container(stateFrame("1", repeat("[", allowed + 1) + repeat("]", allowed + 1)))), kRefused);
-    EXPECT_EQ(outcome(container(stateFrame("1", repeat("{\"a\":", 600) + "1" + repeat("}", 600)))), kRefused);
-    EXPECT_EQ(outcome(repeat("[", 1'000'000)), kRefused) << "no recursion that a deep document can exhaust";
 }
 
 TEST(HostileContainers, HugeArrays) {
@@ -103,34 +97,13 @@ TEST(HostileContainers, HugeArrays) {
     EXPECT_EQ(outcome(container(R"({"Type":"InputReport","Timestamp":1,"Data":")" + repeat("ab ", 100'000) + "\"}")), "");
 }
 
-TEST(HostileContainers, InvalidUTF8IsRefusedWherever) {
-    for (const std::string bad : {"\xff", "\xc0\xaf", "\xed\xa0\x80", "\xe2\x82", "\xf4\x90\x80\x80"}) {
-        EXPECT_EQ(outcome(container(R"({"Type":"State","Timestamp":1,"Key":")" + bad + "\"}")), kRefused);
-        EXPECT_EQ(outcome(container(stateFrame("1", "\"" + bad + "\""))), kRefused);
-        EXPECT_EQ(outcome(container(R"({"Type":"InputReport","Timestamp":1,"Data":"01 )" + bad + "\"}")), kRefused);
-        EXPECT_EQ(outcome(container("{\"" + bad + "\":1,\"Type\":\"Metadata\",\"Timestamp\":1,\"Key\":\"k\"}")), kRefused);
-    }
-    EXPECT_EQ(outcome(std::string(R"({"Version":2,"Frames":[]})") + '\0'), kRefused) << "text after a NUL byte";
-}
-
-TEST(HostileContainers, MalformedStructureGetsItsDocumentedError) {
-    const std::pair<std::string, const char*> cases[] = {
-        {"", kRefused},
-        {"[]", kRefused},
-        {R"({"Version":"2"})", "runtime: migrateSerializedContainer failed: invalid version"},
-        {R"({"Version":-1})", "runtime: migrateSerializedContainer failed: invalid container version: 18446744073709551615"},
-        {R"({"Version":2,"Frames":{}})", "invalid-argument: invalid frames"},
-        {R"({"Version":2})", "invalid-argument: invalid frames"},
-        {container("1"), "invalid-argument: invalid frame"},
-        {container("1", "1"), "runtime: migrateSerializedContainer failed: frame isn't an object"},
-        {R"({"Version":1,"Frames":7})", "runtime: migrateSerializedContainer failed: Frames isn't an array"},
-        {R"({"Version":0,"Reports":"x"})", "runtime: migrateSerializedContainer failed: Reports isn't an array"},
-        {R"({"Version":0,"Reports":[null]})", "runtime: migrateSerializedContainer failed: frame isn't an object"},
-        {container(R"({"Type":"InputReport","Timestamp":1,"Data":"100"})"), "invalid-argument: invalid hex string"},
-        {container(R"({"Type":"Accel","Timestamp":1})"), "invalid-argument: invalid frame type"},
-        {container(R"({"Type":"Metadata","Timestamp":1,"Key":5})"), "invalid-argument: invalid metadata key"},
-    };
-    for (const auto& [text, expected] : cases) EXPECT_EQ(outcome(text), expected) << text;
+// The other malformed containers are covered with the recording's own tests.
+TEST(HostileContainers, EmptyTextInvalidUTF8AndANegativeVersionAreRefused) {
+    EXPECT_EQ(outcome(""), kRefused);
+    EXPECT_EQ(outcome(container(stateFrame("1", "\"\xC3\""))), kRefused);  // a truncated sequence in a value
+    EXPECT_EQ(outcome(container(R"({"Type":"State","Timestamp":1,"Key":")" + std::string("\xFF") + "\"}")), kRefused);
+    EXPECT_EQ(outcome(R"({"Version":-1})"),
+              "runtime: migrateSerializedContainer failed: invalid container version: 18446744073709551615");
 }
 
 }  // namespace

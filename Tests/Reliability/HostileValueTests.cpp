@@ -1,12 +1,11 @@
 // Whatever a property caller or the sensor sends, the pipeline does something defined: parameters
-// store the documented conversion of any value, extreme parameters and wrapping clocks leave the
-// gesture stream well-formed and reproducible, and reports of any length and ID are classified
-// and recorded byte for byte.
+// store the documented conversion of any number, extreme parameters and wrapping clocks leave
+// the gesture stream well-formed and reproducible, and reports of any length and ID are classified.
 
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
-#include <cstring>
+#include <functional>
 #include <limits>
 #include <memory>
 #include <string>
@@ -14,7 +13,6 @@
 
 #include <gtest/gtest.h>
 
-#include "Shared/Recording/PipelineRecording.h"
 #include "Tests/Service/ServiceTestSupport.h"
 
 namespace ZeltoTouch::Reliability {
@@ -74,60 +72,40 @@ std::vector<EventSummary> checkedSession(const std::vector<Write>& writes) {
     return first.events;
 }
 
+// Non-numbers are written as 0, a value the extreme parameters below include.
 const std::vector<std::pair<const char*, PropertyValue>>& hostileValues() {
-    using limits = std::numeric_limits<double>;
-    static const std::vector<std::pair<const char*, PropertyValue>> values = {
-        {"NaN", PropertyValue::fromDouble(limits::quiet_NaN())}, {"+inf", PropertyValue::fromDouble(limits::infinity())},
-        {"float NaN", PropertyValue::fromFloat(std::numeric_limits<float>::quiet_NaN())},
-        {"-inf", PropertyValue::fromFloat(-std::numeric_limits<float>::infinity())},
-        {"-1", PropertyValue::fromInt32(-1)}, {"-0.0", PropertyValue::fromDouble(-0.0)},
-        {"-2.5", PropertyValue::fromDouble(-2.5)}, {"denormal", PropertyValue::fromDouble(limits::denorm_min())},
-        {"int64 min", PropertyValue::fromInt64(std::numeric_limits<int64_t>::min())},
-        {"uint64 max", PropertyValue::fromUInt64(std::numeric_limits<uint64_t>::max())},
-        {"1e300", PropertyValue::fromDouble(1e300)}, {"-1e300", PropertyValue::fromDouble(-1e300)},
-        {"2^64 as double", PropertyValue::fromDouble(18446744073709551616.0)},
-        {"string", PropertyValue::string("250")}, {"null", PropertyValue::null()}, {"no value", PropertyValue()},
-        {"array", PropertyValue::array({PropertyValue::fromUInt32(1)})}, {"data", PropertyValue::data(Bytes{1, 2, 3})},
-        {"dictionary", PropertyValue::dictionary({{"a", PropertyValue::fromUInt32(1)}})},
+    using PV = PropertyValue;
+    using D = std::numeric_limits<double>;
+    using F = std::numeric_limits<float>;
+    static const std::vector<std::pair<const char*, PV>> values = {
+        {"NaN", PV::fromDouble(D::quiet_NaN())}, {"+inf", PV::fromDouble(D::infinity())}, {"-1", PV::fromInt32(-1)},
+        {"float NaN", PV::fromFloat(F::quiet_NaN())}, {"-inf", PV::fromFloat(-F::infinity())},
+        {"-2.5", PV::fromDouble(-2.5)}, {"-0.0", PV::fromDouble(-0.0)}, {"denormal", PV::fromDouble(D::denorm_min())},
+        {"int64 min", PV::fromInt64(std::numeric_limits<int64_t>::min())}, {"1e300", PV::fromDouble(1e300)},
+        {"-1e300", PV::fromDouble(-1e300)},
+        {"uint64 max", PV::fromUInt64(std::numeric_limits<uint64_t>::max())},
+        {"2^64 as double", PV::fromDouble(18446744073709551616.0)},
     };
     return values;
 }
 
-std::vector<float> factorTable(Pipeline& pipeline) {
-    std::vector<float> factors;
-    for (int n = 0; n < 23; ++n) {
-        factors.push_back(pipeline.getState("Algs.VirtualNormalizationFactors." + std::to_string(n)).toFloat());
-    }
-    return factors;
-}
-
-TEST(HostileValues, EveryTunableKeyStoresTheDocumentedConversionOfAnyValue) {
-    for (const std::string key : {"EnableHoldSuppression", "EnableTapSuppression", "HoldTimeoutMilliseconds",
-                                  "ActivationThreshold", "VirtualNormalizationFactors.0", "VirtualNormalizationFactors.22",
-                                  "VirtualNormalizationFactors.23", "VirtualNormalizationFactors.-1", "ResetEventStats",
-                                  "EventStats", "DebugInfo"}) {
+// Conversions of ordinary values, out-of-range factor indices and read-only keys are covered
+// with the parameters' own tests; these are the numbers no conversion table lists.
+TEST(HostileValues, WritableKeysStoreTheConversionOfNaNInfinitiesAndExtremeNumbers) {
+    for (const std::string key :
+         {"EnableTapSuppression", "HoldTimeoutMilliseconds", "ActivationThreshold", "VirtualNormalizationFactors.22"}) {
         for (const auto& [name, value] : hostileValues()) {
             SCOPED_TRACE(key + " = " + name);
             Pipeline pipeline;
-            const PropertyValue before = pipeline.getState("Algs." + key);
-            const std::vector<float> factorsBefore = factorTable(pipeline);
             pipeline.setState(0, "Algs." + key, value);
-            // Non-numbers are written as 0.
-            const PropertyValue number = value.isNumber() ? value : PropertyValue::fromUInt64(0);
             const PropertyValue read = pipeline.getState("Algs." + key);
-            if (key == "EnableHoldSuppression" || key == "EnableTapSuppression") {
-                EXPECT_EQ(read, PropertyValue::fromBool(number.toBool()));
+            if (key == "EnableTapSuppression") {
+                EXPECT_EQ(read, PropertyValue::fromBool(value.toBool()));
             } else if (key == "HoldTimeoutMilliseconds") {
-                EXPECT_EQ(read.toUInt64(), number.toUInt64() & 0xFFFFFFFFu);
-            } else if (key == "ActivationThreshold" || key.ends_with(".0") || key.ends_with(".22")) {
-                ASSERT_TRUE(read.isNumber());
-                EXPECT_TRUE(std::isnan(number.toFloat()) ? std::isnan(read.toFloat()) : read.toFloat() == number.toFloat())
-                    << read.toFloat() << " vs " << number.toFloat();
-            } else if (key == "ResetEventStats" || key.ends_with(".23") || key.ends_with(".-1")) {
-                EXPECT_FALSE(read.hasValue());
-                EXPECT_EQ(factorTable(pipeline), factorsBefore);
-            } else {  // read-only keys
-                EXPECT_EQ(read, before);
+                EXPECT_EQ(read.toUInt64(), value.toUInt64() & 0xFFFFFFFFu);
+            } else {
+                EXPECT_TRUE(std::isnan(value.toFloat()) ? std::isnan(read.toFloat()) : read.toFloat() == value.toFloat())
+                    << read.toFloat() << " vs " << value.toFloat();
             }
         }
     }
@@ -171,9 +149,7 @@ TEST(HostileValues, WrappingFrameTimesAndNumbersChangeNothing) {
     std::vector<Bytes> reports = reportsOfScript(kSession, 0xFFFFFFFFu - 1500);  // wraps after 1.5 s
     for (Bytes& report : reports) {
         if (report[0] != InputReport::Image::kReportID) continue;
-        uint32_t frameNumber = report[1] | report[2] << 8 | report[3] << 16 | static_cast<uint32_t>(report[4]) << 24;
-        frameNumber += kFrameNumberOffset;
-        for (int i = 0; i < 4; ++i) report[1 + i] = static_cast<uint8_t>(frameNumber >> (8 * i));
+        put32(&report[1], get32(&report[1]) + kFrameNumberOffset);
     }
     wrapped.play(reports);
 
@@ -192,36 +168,29 @@ TEST(HostileValues, WrappingFrameTimesAndNumbersChangeNothing) {
 }
 
 // Reports of every length from 0 to 600 with every report ID: each reaches exactly the probe its
-// ID and length call for, and the recording keeps every byte through its container (checked for
-// the IDs the system knows and the extremes; the container does not look at IDs).
+// ID and length call for (an image from 73 bytes on, a firmware event from 10).
 TEST(HostileValues, ReportsOfEveryLengthAndID) {
     constexpr int kMaxLength = 600;
     uint32_t noise = 0x12345678;  // fills the reports with reproducible junk
     for (int id = 0; id < 256; ++id) {
         SCOPED_TRACE("report ID " + std::to_string(id));
-        auto pipeline = std::make_shared<Pipeline>();
+        Pipeline pipeline;
         int images = 0, firmwareEvents = 0, invalid = 0;
-        pipeline->imageProbe = std::make_shared<std::function<void(uint64_t, const InputReport::Image&)>>(
+        pipeline.imageProbe = std::make_shared<std::function<void(uint64_t, const InputReport::Image&)>>(
             [&](uint64_t, const InputReport::Image&) { ++images; });
-        pipeline->firmwareEventProbe = std::make_shared<std::function<void(uint64_t, const InputReport::FirmwareEvent&)>>(
+        pipeline.firmwareEventProbe = std::make_shared<std::function<void(uint64_t, const InputReport::FirmwareEvent&)>>(
             [&](uint64_t, const InputReport::FirmwareEvent&) { ++firmwareEvents; });
-        pipeline->invalidInputReportProbe = std::make_shared<std::function<void(uint64_t, const uint8_t*, uint64_t)>>(
+        pipeline.invalidInputReportProbe = std::make_shared<std::function<void(uint64_t, const uint8_t*, uint64_t)>>(
             [&](uint64_t, const uint8_t*, uint64_t) { ++invalid; });
-        PipelineRecording recording;
-        recording.pipeline = pipeline;
         for (int length = 0; length <= kMaxLength; ++length) {
             Bytes report(length);
             for (uint8_t& byte : report) byte = static_cast<uint8_t>((noise = noise * 1664525u + 1013904223u) >> 24);
             if (length) report[0] = static_cast<uint8_t>(id);
-            recording.handleInputReport(length, report.data(), report.size());
+            pipeline.handleInputReport(length, report.data(), report.size());
         }
         EXPECT_EQ(images, id == InputReport::Image::kReportID ? kMaxLength + 1 - 73 : 0);
         EXPECT_EQ(firmwareEvents, id == InputReport::FirmwareEvent::kReportID ? kMaxLength + 1 - 10 : 0);
         EXPECT_EQ(images + firmwareEvents + invalid, kMaxLength + 1);
-        if (id <= 3 || id == FeatureReport::FactoryResetHoldDuration::kReportID || id == 0xFF) {
-            const PropertyValue written = recording.json();  // hex of the bytes as they came
-            EXPECT_TRUE(PipelineRecording(written).json() == written) << "the bytes read back are not those written";
-        }
     }
 }
 

@@ -1,6 +1,5 @@
 #include <memory>
 #include <stdexcept>
-#include <string>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -74,7 +73,7 @@ TEST(ServiceAccelerometerHandler, RecordsNarrowedSamplesAtArrivalTime) {
     EXPECT_EQ(accel.samples.front().z, -0.98f);
 }
 
-TEST(AccelSystemConstruction, MissingArgumentsAndARateOfZeroAreRefused) {
+TEST(AccelSystemConstruction, MissingArgumentsARateOfZeroNoEventSystemClientOrNoAccelerometerAreRefused) {
     const auto loop = Platform::RunLoop::current();
     const AccelSystem::Handler handler = [](const HIDEvent&) {};
     using Case = std::tuple<std::shared_ptr<Platform::RunLoop>, const char*, uint32_t, AccelSystem::Handler>;
@@ -87,55 +86,12 @@ TEST(AccelSystemConstruction, MissingArgumentsAndARateOfZeroAreRefused) {
             EXPECT_STREQ(error.what(), "nil argument");
         }
     }
-}
-
-TEST(AccelSystemConstruction, FailsWhenTheEventSystemHasNoClientOrNoAccelerometer) {
-    const auto construct = [] { AccelSystem(Platform::RunLoop::current(), "AccelTest", 100, [](const HIDEvent&) {}); };
+    const auto construct = [&] { AccelSystem(loop, "AccelTest", 100, handler); };
     Platform::EventServiceRegistry::shared().setClientCreationRefused(true);
     EXPECT_THROW(construct(), std::runtime_error);
     Platform::EventServiceRegistry::shared().setClientCreationRefused(false);
-    const ScopedEventServices none({});
+    const ScopedNoEventServices none;
     EXPECT_THROW(construct(), std::runtime_error);
-}
-
-// An event-system service that matches the accelerometer's usage and sends a mix of events.
-class MixedEventsService final : public Platform::EventSystemService {
-public:
-    PropertyValue copyProperty(std::string_view key) const override {
-        if (key == "PrimaryUsagePage") return PropertyValue::fromUInt32(0xFF00);
-        return key == "PrimaryUsage" ? PropertyValue::fromUInt32(3) : PropertyValue();
-    }
-    bool setProperty(std::string_view key, const PropertyValue& value) override {
-        if (key == "ReportInterval") reportInterval = value.toDouble();
-        return true;
-    }
-    std::unique_ptr<Platform::EventStream> openStream(const std::shared_ptr<Platform::RunLoop>& runLoop,
-                                                      const std::string& mode,
-                                                      Platform::HIDEventHandler handler) override {
-        for (const HIDEventRef& event : {HIDEvent::createDigitizerEvent(1, 2, 0, 0, 0, 0, 0, 1, 0, 0, 0, false, false, 0),
-                                         HIDEvent::createAccelerometerEvent(2, 0.5, 0, -1, 0),
-                                         HIDEvent::createVendorDefinedEvent(3, 0xFF60, 2, 0, nullptr, 0, 0),
-                                         HIDEvent::createAccelerometerEvent(4, 0.25, 0, -1, 0)}) {
-            runLoop->perform(mode, [handler, event] { handler(event); });
-        }
-        runLoop->perform(mode, [runLoop] { runLoop->stop(); });
-        return std::make_unique<Platform::EventStream>();
-    }
-
-    double reportInterval = 0;
-};
-
-TEST(AccelSystemDelivery, AsksForTheRateAsAnIntervalAndPassesOnlyAccelerometerEvents) {
-    const auto mixed = std::make_shared<MixedEventsService>();
-    const ScopedEventServices only({mixed});
-    std::vector<uint64_t> timestamps;
-    AccelSystem accel(Platform::RunLoop::current(), "AccelTest", 50,
-                      [&](const HIDEvent& event) { timestamps.push_back(event.timestamp()); });
-    EXPECT_EQ(mixed->reportInterval, 20000.0) << "microseconds between samples";
-    Platform::RunLoop::current()->runInMode("AccelTest");
-    EXPECT_EQ(timestamps, (std::vector<uint64_t>{2, 4}));
-    accel.cleanup();
-    accel.cleanup();
 }
 
 }  // namespace

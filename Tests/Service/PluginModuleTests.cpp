@@ -2,14 +2,11 @@
 
 #include <dlfcn.h>
 
-#include <chrono>
 #include <memory>
-#include <thread>
 
 #include <gtest/gtest.h>
 
 #include "Platform/PluginHost.h"
-#include "Platform/SimulatedSensor.h"
 #include "Tests/Service/ServiceTestSupport.h"
 
 namespace ZeltoTouch::ServiceTest {
@@ -32,15 +29,25 @@ uint32_t countOf(void* interfacePointer) {
     return table.Release(interfacePointer);
 }
 
-TEST(PluginReferences, InterfacesShareOneCountAndTheLastReleaseDestroys) {
+// The factory and QueryInterface refuse other types without taking a reference.
+TEST(PluginReferences, InterfacesShareOneCountOtherTypesAreRefusedAndTheLastReleaseDestroys) {
     RawModule module;
+    ASSERT_NE(module.factory, nullptr);
+    EXPECT_EQ(module.factory(nullptr, kZeltoHIDServiceInterfaceID), nullptr);
+    EXPECT_EQ(module.factory(nullptr, ZeltoUUID{}), nullptr);
     void* plugin = module.factory(nullptr, kZeltoHIDServicePlugInTypeID);
     ASSERT_NE(plugin, nullptr);
     auto& table = pluginTable(plugin);
     EXPECT_EQ(table.version, 1);
     EXPECT_EQ(table.revision, 0);
     EXPECT_EQ(countOf(plugin), 1u) << "the host holds exactly one reference";
-
+    const ZeltoUUID genericUnknown = {{0, 0, 0, 0, 0, 0, 0, 0, 0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
+    for (const ZeltoUUID& id : {genericUnknown, kZeltoHIDServicePlugInTypeID, ZeltoUUID{}}) {
+        void* out = &module;
+        EXPECT_EQ(table.QueryInterface(plugin, id, &out), kZeltoNoInterface);
+        EXPECT_EQ(out, &module) << "out is left untouched";
+        EXPECT_EQ(countOf(plugin), 1u);
+    }
     EXPECT_EQ(table.AddRef(plugin), 2u);
     EXPECT_EQ(table.Release(plugin), 1u);
 
@@ -57,23 +64,6 @@ TEST(PluginReferences, InterfacesShareOneCountAndTheLastReleaseDestroys) {
     EXPECT_EQ(table.Release(plugin), 1u);
 
     EXPECT_EQ(table.Release(plugin), 0u);  // frees the object and both tables (asan checks)
-}
-
-TEST(PluginReferences, TheFactoryAndQueryInterfaceRefuseOtherTypesWithoutAReference) {
-    RawModule module;
-    ASSERT_NE(module.factory, nullptr);
-    EXPECT_EQ(module.factory(nullptr, kZeltoHIDServiceInterfaceID), nullptr);
-    EXPECT_EQ(module.factory(nullptr, ZeltoUUID{}), nullptr);
-    void* plugin = module.factory(nullptr, kZeltoHIDServicePlugInTypeID);
-    ASSERT_NE(plugin, nullptr);
-    const ZeltoUUID genericUnknown = {{0, 0, 0, 0, 0, 0, 0, 0, 0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
-    for (const ZeltoUUID& id : {genericUnknown, kZeltoHIDServicePlugInTypeID, ZeltoUUID{}}) {
-        void* out = &module;
-        EXPECT_EQ(pluginTable(plugin).QueryInterface(plugin, id, &out), kZeltoNoInterface);
-        EXPECT_EQ(out, &module) << "out is left untouched";
-        EXPECT_EQ(countOf(plugin), 1u);
-    }
-    EXPECT_EQ(pluginTable(plugin).Release(plugin), 0u);
 }
 
 class PluginLifecycle : public testing::Test {
@@ -116,14 +106,10 @@ TEST_F(PluginLifecycle, ProbeStartStopAndRestartThroughTheTables) {
     EXPECT_FALSE(serviceTable(service).setProperty(service, nullptr, nullptr));
 }
 
-// A simulated sensor plays a short script in real time; the events arrive through the table
-// callback on the host's queue, exactly those the pipeline makes of the script's reports.
-TEST_F(PluginLifecycle, ScriptedSensorEndToEnd) {
-    constexpr const char* kScript = "idle 100ms\ntap volume-up 120ms\nidle 300ms\nhold play-pause 800ms\nidle 300ms\n";
-    auto sensor = std::make_shared<Platform::SimulatedSensor>(Platform::GestureScriptParser::parse(kScript));
-    Platform::ScopedDeviceService sensorService([sensor] { return sensor; });
-
-    ASSERT_EQ(host->start(sensorService.handle()), kZeltoSuccess);
+// Events arrive through the table callback on the host's queue, exactly those the pipeline
+// makes of the reports.
+TEST_F(PluginLifecycle, ReportsBecomeEventsThroughTheTables) {
+    ASSERT_EQ(host->start(registered.service.handle()), kZeltoSuccess);
     ASSERT_TRUE(host->open());
     void* service = host->serviceInterface();
     auto queue = Platform::DispatchQueue::fromHandle(host->queue().handle());
@@ -131,17 +117,14 @@ TEST_F(PluginLifecycle, ScriptedSensorEndToEnd) {
     EventCollector collector(queue, &refcon, service);
     serviceTable(service).setEventCallback(service, EventCollector::callback, &collector, &refcon);
     serviceTable(service).scheduleWithDispatchQueue(service, queue->handle());
-
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(20);
-    while (!sensor->playbackFinished() && std::chrono::steady_clock::now() < deadline) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(20));
-    }
-    ASSERT_TRUE(sensor->playbackFinished());
+    ASSERT_TRUE(registered.device->waitUntilScheduled());
+    const auto reports = reportsOfScript("idle 100ms\ntap volume-up 120ms\nidle 300ms\nhold play-pause 800ms\nidle 300ms\n");
+    for (const Bytes& report : reports) ASSERT_TRUE(registered.device->deliver(report));
     serviceTable(service).unscheduleFromDispatchQueue(service, queue->handle());
     queue->barrier();
 
     EventTrace expected;
-    expected.play(reportsOfScript(kScript));
+    expected.play(reports);
     ASSERT_GE(expected.events.size(), 4u) << "may-begin and tap, may-begin and hold start at least";
     EXPECT_EQ(collector.events(), expected.events);
 }

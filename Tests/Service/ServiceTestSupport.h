@@ -71,10 +71,7 @@ inline Platform::CaptureLogSink& logCapture() {
 }();
 
 // Owns the creation reference of a service.
-struct ServiceRelease {
-    void operator()(ZeltoHIDService* service) const noexcept { service->release(); }
-};
-using ServicePointer = std::unique_ptr<ZeltoTouchHIDService, ServiceRelease>;
+using ServicePointer = std::unique_ptr<ZeltoTouchHIDService, decltype([](ZeltoHIDService* s) { s->release(); })>;
 inline ServicePointer makeService() { return ServicePointer(ZeltoTouchHIDService::create()); }
 
 // A device the test feeds with input reports, each delivered on the run loop the service
@@ -173,21 +170,16 @@ struct RegisteredDevice {
     Platform::ScopedDeviceService service{[device = device] { return device; }};
 };
 
-// The event system offers only these services for the lifetime of this object.
-class ScopedEventServices {
+// The event system offers no services for the lifetime of this object.
+class ScopedNoEventServices {
 public:
-    using Services = std::vector<std::shared_ptr<Platform::EventSystemService>>;
-    explicit ScopedEventServices(const Services& services) { replace(services); }
-    ScopedEventServices(const ScopedEventServices&) = delete;
-    ~ScopedEventServices() { replace(_original); }
+    ScopedNoEventServices() { for (const auto& service : _original) registry().remove(service); }
+    ScopedNoEventServices(const ScopedNoEventServices&) = delete;
+    ~ScopedNoEventServices() { for (const auto& service : _original) registry().add(service); }
 
 private:
-    static void replace(const Services& services) {
-        auto& registry = Platform::EventServiceRegistry::shared();
-        for (const auto& service : registry.services()) registry.remove(service);
-        for (const auto& service : services) registry.add(service);
-    }
-    const Services _original = Platform::EventServiceRegistry::shared().services();
+    static Platform::EventServiceRegistry& registry() { return Platform::EventServiceRegistry::shared(); }
+    const std::vector<std::shared_ptr<Platform::EventSystemService>> _original = registry().services();
 };
 
 // What a gesture event says, for comparing event streams.
@@ -268,6 +260,12 @@ inline std::vector<Bytes> reportsOfScript(std::string_view scriptText, uint32_t 
     std::vector<Bytes> reports;
     for (Platform::SimulatedReport& report : generator.generateAll()) reports.push_back(std::move(report.bytes));
     return reports;
+}
+
+// Little-endian 32-bit fields of a report.
+constexpr uint32_t get32(const uint8_t* p) { return p[0] | p[1] << 8 | p[2] << 16 | static_cast<uint32_t>(p[3]) << 24; }
+inline void put32(uint8_t* p, uint32_t v) {
+    for (int i = 0; i < 4; ++i) p[i] = static_cast<uint8_t>(v >> (8 * i));
 }
 
 // Threads of this process right now.

@@ -28,10 +28,8 @@ protected:
     RegisteredDevice registered;
     ServicePointer service = makeService();
 };
-class ServiceLifecycle : public StartedService {};
-class ServiceProperties : public StartedService {};
 
-TEST_F(ServiceLifecycle, OpenAndCloseReachTheDeviceWithTheHostsOptions) {
+TEST_F(StartedService, OpenAndCloseReachTheDeviceWithTheHostsOptionsAndHostOperationsLogTheirNames) {
     EXPECT_TRUE(service->openWithOptions(0x2A));
     registered.device->openStatus = kZeltoNoResources;
     EXPECT_FALSE(service->openWithOptions(7));
@@ -40,9 +38,6 @@ TEST_F(ServiceLifecycle, OpenAndCloseReachTheDeviceWithTheHostsOptions) {
     EXPECT_EQ(registered.device->closeOptions, (std::vector<uint32_t>{0x10}));
     EXPECT_EQ(logCapture().countEqual("openWithOptions:2a"), 1u);
     EXPECT_EQ(logCapture().countEqual("closeWithOptions:10"), 1u);
-}
-
-TEST_F(ServiceLifecycle, HostOperationsLogTheirNames) {
     const std::pair<std::function<void(ZeltoTouchHIDService&)>, const char*> cases[] = {
         {[](auto& s) { s.probeWithService(0, PropertyValue(), nullptr); }, "probeWithService:properties:outScore:"},
         {[](auto& s) { s.startWithService(0, PropertyValue()); }, "startWithService:properties:"},
@@ -59,16 +54,7 @@ TEST_F(ServiceLifecycle, HostOperationsLogTheirNames) {
     }
 }
 
-TEST_F(ServiceProperties, VersionIsThreeSignedNumbers) {
-    const PropertyValue version = get("Version");
-    EXPECT_TRUE(version == PropertyValue::array({PropertyValue::fromInt32(17), PropertyValue::fromInt32(0),
-                                                 PropertyValue::fromInt32(0)}));
-    for (const PropertyValue& number : version.elements()) {
-        EXPECT_EQ(number.numberKind(), PropertyValue::NumberKind::Int32);
-    }
-}
-
-TEST_F(ServiceProperties, FirmwareDebugReportsHasTenEntriesEvenWhenOneIsRefused) {
+TEST_F(StartedService, FirmwareDebugReportsHasTenEntriesEvenWhenOneIsRefusedAndHoldDurationParsesReport0x1F) {
     registered.device->featureFailures[0x04] = static_cast<ZeltoReturn>(0xE00002F0u);
     const PropertyValue reports = get("FirmwareDebugReports");
     EXPECT_EQ(reports.keys().size(), 10u);
@@ -78,9 +64,6 @@ TEST_F(ServiceProperties, FirmwareDebugReportsHasTenEntriesEvenWhenOneIsRefused)
         for (uint32_t i = 0; i < 8; ++i) hex += format("%02x ", id + i);
         EXPECT_EQ(reports.get(format("0x%02jx", id)).stringView(), hex) << id;
     }
-}
-
-TEST_F(ServiceProperties, FactoryResetHoldDurationParsesReport0x1F) {
     registered.device->featureReports[0x1F] = {0x1F, 0x10, 0x27, 0x00, 0x00};
     EXPECT_TRUE(get("FactoryResetHoldDuration") == PropertyValue::fromUInt32(10000));
     EXPECT_EQ(get("FactoryResetHoldDuration").numberKind(), PropertyValue::NumberKind::UInt32);
@@ -90,7 +73,7 @@ TEST_F(ServiceProperties, FactoryResetHoldDurationParsesReport0x1F) {
     EXPECT_FALSE(get("FactoryResetHoldDuration").hasValue()) << "a refused report";
 }
 
-TEST_F(ServiceProperties, OnlyTheDottedPipelineDomainReachesThePipelineTheRestIsTheDevices) {
+TEST_F(StartedService, OnlyStringKeysAndOnlyTheDottedPipelineDomainReachThePipelineTheRestIsTheDevices) {
     registered.device->properties = {{"Pipeline", PropertyValue::string("device's own")},
                                      {"pipeline.DebugInfo", PropertyValue::string("device's too")}};
     EXPECT_TRUE(get("Pipeline.DebugInfo").get("ResetCount") == PropertyValue::fromUInt32(0));
@@ -99,6 +82,10 @@ TEST_F(ServiceProperties, OnlyTheDottedPipelineDomainReachesThePipelineTheRestIs
     EXPECT_EQ(get("pipeline.DebugInfo").stringView(), "device's too");
     EXPECT_FALSE(get("Pipeline.NoSuchKey").hasValue());
     EXPECT_FALSE(get("SomethingElse").hasValue());
+    for (const PropertyValue& key : {PropertyValue(), PropertyValue::fromInt32(1)}) {
+        EXPECT_FALSE(service->getPropertyForKey(key).hasValue());
+        EXPECT_FALSE(service->setProperty(PropertyValue::fromInt32(1), key));
+    }
 
     EXPECT_TRUE(set("Version", PropertyValue::fromInt32(3)));
     EXPECT_EQ(registered.device->properties["Version"].toUInt64(), 3u);
@@ -108,16 +95,9 @@ TEST_F(ServiceProperties, OnlyTheDottedPipelineDomainReachesThePipelineTheRestIs
     EXPECT_TRUE(PipelineRecording(get("Recording")).frames().empty());
 }
 
-TEST_F(ServiceProperties, MissingOrNonStringKeysReadNothingAndRefuseWrites) {
-    for (const PropertyValue& key : {PropertyValue(), PropertyValue::fromInt32(1)}) {
-        EXPECT_FALSE(service->getPropertyForKey(key).hasValue());
-        EXPECT_FALSE(service->setProperty(PropertyValue::fromInt32(1), key));
-    }
-}
-
 // Pipeline writes are recorded without the domain. Data and NaN have no JSON form: they still
 // reach the pipeline, but only the frames that can be written make up the container.
-TEST_F(ServiceProperties, PipelineWritesReturnTrueAndTheRecordingHoldsThoseJSONCanHold) {
+TEST_F(StartedService, PipelineWritesReturnTrueAndTheRecordingHoldsThoseJSONCanHold) {
     EXPECT_TRUE(set("Pipeline.Algs.HoldTimeoutMilliseconds", PropertyValue::fromUInt32(650)));
     EXPECT_TRUE(set("Pipeline.NoSuchKey", PropertyValue::fromInt32(1)));
     EXPECT_TRUE(set("Pipeline.Algs.Blob", PropertyValue::data(std::vector<uint8_t>{1, 2})));
@@ -140,13 +120,17 @@ TEST_F(ServiceProperties, PipelineWritesReturnTrueAndTheRecordingHoldsThoseJSONC
     EXPECT_EQ(logCapture().countEqual("getPropertyForKey:Recording"), 1u);
 }
 
-TEST_F(ServiceProperties, ServicePluginDebugCombinesFiveKeysAndWithoutADeviceTheDeviceKeysHaveNoValue) {
+TEST_F(StartedService, VersionIsThreeSignedNumbersAndServicePluginDebugCombinesFiveKeysWithoutADeviceFour) {
+    const PropertyValue version = get("Version");
+    EXPECT_EQ(version, PropertyValue::array({PropertyValue::fromInt32(17), PropertyValue::fromInt32(0),
+                                             PropertyValue::fromInt32(0)}));
+    for (const PropertyValue& n : version.elements()) EXPECT_EQ(n.numberKind(), PropertyValue::NumberKind::Int32);
     const PropertyValue debug = get("ServicePluginDebug");
     std::vector<std::string> keys = debug.keys();
     std::sort(keys.begin(), keys.end());
     EXPECT_EQ(keys, (std::vector<std::string>{"FirmwareDebugReports", "Pipeline.Algs.DebugInfo", "Pipeline.DebugInfo",
                                               "Recording", "Version"}));
-    EXPECT_EQ(debug.get("Version"), get("Version"));
+    EXPECT_EQ(debug.get("Version"), version);
     EXPECT_EQ(debug.get("Pipeline.DebugInfo"), get("Pipeline.DebugInfo"));
 
     ASSERT_EQ(service->stop(), kZeltoSuccess);
