@@ -212,7 +212,7 @@ void BM_RecordingCopyUnderLock(benchmark::State& state) {
     for (auto _ : state) {
         state.PauseTiming();
         std::optional<PipelineRecording> copy(std::in_place);
-        copy->reserveFrames(2 * ZeltoTouchHIDService::kMaxRecordedFrames);
+        copy->reserveFrames(recording.frames().size() + ZeltoTouchHIDService::kFramesArrivingDuringRecordingRead);
         state.ResumeTiming();
         std::unique_lock lock(pipelineLock);
         *copy = recording;

@@ -122,22 +122,26 @@ constexpr char kHex[] = "0123456789abcdef";
 
 void appendQuoted(std::string& out, std::string_view text) {
     out += '"';
-    for (char c : text) {
-        switch (c) {
+    // Runs of characters that need no escape go in whole.
+    for (size_t start = 0; start < text.size();) {
+        const auto special = std::find_if(text.begin() + start, text.end(), [](char c) {
+            return c == '"' || c == '\\' || static_cast<unsigned char>(c) < 0x20;
+        });
+        const size_t end = static_cast<size_t>(special - text.begin());
+        out.append(text, start, end - start);
+        if (end == text.size()) break;
+        switch (const char c = text[end]) {
             case '"': out += "\\\""; break;
             case '\\': out += "\\\\"; break;
             case '\n': out += "\\n"; break;
             case '\r': out += "\\r"; break;
             case '\t': out += "\\t"; break;
             default:
-                if (static_cast<unsigned char>(c) < 0x20) {
-                    out += "\\u00";
-                    out += kHex[(c >> 4) & 0xF];
-                    out += kHex[c & 0xF];
-                } else {
-                    out += c;
-                }
+                out += "\\u00";
+                out += kHex[(c >> 4) & 0xF];
+                out += kHex[c & 0xF];
         }
+        start = end + 1;
     }
     out += '"';
 }

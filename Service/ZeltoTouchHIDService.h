@@ -44,6 +44,9 @@ public:
     // The run-loop mode in which the input report thread runs.
     static constexpr const char* kInputReportsRunLoopMode = "kHandleInputReportsRunLoopMode";
     static constexpr uint64_t kMaxRecordedFrames = 4350;
+    // A "Recording" read makes room for the frames recorded so far plus this many, for the
+    // reports that can arrive before it takes the lock again to copy them.
+    static constexpr size_t kFramesArrivingDuringRecordingRead = 64;
 
     // A new service holding one reference (the caller's).
     static ZeltoTouchHIDService* create() { return new ZeltoTouchHIDService; }

@@ -114,11 +114,14 @@ PropertyValue ZeltoTouchHIDService::factoryResetHoldDuration() const {
 // pipeline and the recording; leaving just that frame out keeps the rest of the recording
 // readable.
 PropertyValue ZeltoTouchHIDService::recordingJSON() {
-    // Trimming keeps the recording below twice its limit (unless a flood of distinct state
-    // keys holds it above), so the copy made under the lock writes only to resident memory.
-    PipelineRecording copy;
-    copy.reserveFrames(2 * kMaxRecordedFrames);
+    // Room for what the recording holds now and what may arrive meanwhile, so the copy made
+    // under the lock writes only to resident memory.
     std::unique_lock lock(_pipelineLock);
+    const size_t framesNow = _recording.frames().size();
+    lock.unlock();
+    PipelineRecording copy;
+    copy.reserveFrames(framesNow + kFramesArrivingDuringRecordingRead);
+    lock.lock();
     copy = _recording;
     lock.unlock();
     size_t leftOut = 0;

@@ -1,5 +1,6 @@
 #include <charconv>
 #include <cstdint>
+#include <cstring>
 #include <functional>
 #include <optional>
 #include <span>
@@ -22,7 +23,19 @@ namespace ZeltoTouch {
 namespace {
 
 using Frame = PipelineRecording::Frame;
-using JSONWriter = rapidjson::Writer<rapidjson::StringBuffer>;
+
+// RapidJSON copies a raw value one character at a time; report data and frame values are most
+// of a container's text, so they are copied in one go.
+class JSONWriter final : public rapidjson::Writer<rapidjson::StringBuffer> {
+public:
+    using Writer::Writer;
+
+    void rawValue(std::string_view json, rapidjson::Type type) {
+        Prefix(type);
+        std::memcpy(os_->Push(json.size()), json.data(), json.size());
+        EndValue(true);
+    }
+};
 
 constexpr uint64_t kContainerVersion = 2;
 
@@ -71,13 +84,13 @@ public:
             Util::appendHexText(_hex, frame.data);
             _hex += '"';
             _writer.Key("Data");
-            _writer.RawValue(_hex.data(), _hex.size(), rapidjson::kStringType);
+            _writer.rawValue(_hex, rapidjson::kStringType);
         } else {
             _writer.Key("Key");
             writeString(_writer, frame.key);
             if (frame.value) {
                 _writer.Key("Value");
-                _writer.RawValue(_value.GetString(), _value.GetSize(), rapidjson::kObjectType);
+                _writer.rawValue({_value.GetString(), _value.GetSize()}, rapidjson::kObjectType);
             }
         }
         _writer.EndObject();

@@ -77,6 +77,21 @@ TEST(PropertyValueOwnership, InsertionsThatWouldFormACycleAreRefused) {
     EXPECT_EQ(dictionary.description(), "{\"Array\": [[], []]}");
 }
 
+TEST(PropertyValueDescription, QuotedStringsEscapeQuotesBackslashesAndControlCharacters) {
+    const struct {
+        std::string text;
+        std::string quoted;
+    } cases[] = {
+        {"", "\"\""},
+        {"plain \xC3\xA9", "\"plain \xC3\xA9\""},
+        {"\"a\\b\"", "\"\\\"a\\\\b\\\"\""},
+        {std::string("\n\r\t\x01\x1F\0", 6), "\"\\n\\r\\t\\u0001\\u001f\\u0000\""},
+    };
+    for (const auto& [text, quoted] : cases) {
+        EXPECT_EQ(PV::array({PV::string(text)}).description(), "[" + quoted + "]");
+    }
+}
+
 TEST(PropertyValueDictionary, KeysAreSortedUniqueAndNoValueMeansAbsent) {
     auto dictionary =
         PV::dictionary({"B", "A", "C", "A"}, {PV::fromUInt64(1), PV::fromUInt64(2), PV(), PV::fromUInt64(3)});
