@@ -101,7 +101,7 @@ private:
 
 // A fresh service every so many inputs: bounds what the device's property store and the
 // recording accumulate, and runs the lifecycle again and again under load.
-constexpr uint64_t kInputsPerService = 40;
+constexpr uint64_t kInputsPerService = 10;
 
 std::unique_ptr<LiveService>& liveService() {
     static std::unique_ptr<LiveService> live;
