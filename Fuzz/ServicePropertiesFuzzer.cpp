@@ -13,6 +13,7 @@
 #include <string>
 #include <string_view>
 #include <thread>
+#include <vector>
 
 #include <fuzzer/FuzzedDataProvider.h>
 
@@ -49,15 +50,34 @@ private:
     const std::thread::id _caller = std::this_thread::get_id();
 };
 
-// Over an hour of mixed gestures, a frame every 5 ms.
-Platform::GestureScript sessionScript() {
-    std::string text;
-    for (int round = 0; round < 1000; ++round) {
-        text += "tap volume-up 120ms\nidle 200ms\nhold play-pause 700ms reset-after 400ms\nidle 200ms\n"
-                "slide volume-down volume-up 300ms\nidle 200ms\nbrush play-pause 250ms\nidle 200ms\n"
-                "palm 300ms\nidle 200ms\n";
-    }
-    return Platform::GestureScriptParser::parse(text);
+// A service lives for tens of milliseconds and sees only the start of its script, so services
+// take turns starting with each gesture, and the reset and the slide come early. Faster
+// frames would not race the property calls more, only grow the recording that every
+// "Recording" read serialises.
+constexpr std::string_view kGestures[] = {
+    "tap volume-up 120ms\n",
+    "hold play-pause 700ms reset-after 10ms\n",
+    "slide volume-down volume-up 40ms\n",
+    "brush play-pause 250ms\n",
+    "palm 300ms\n",
+};
+constexpr uint32_t kFramePeriodMs = 5;
+
+const Platform::GestureScript& nextScript() {
+    static const auto scripts = [] {
+        std::vector<Platform::GestureScript> rotations;
+        for (size_t first = 0; first < std::size(kGestures); ++first) {
+            std::string text;
+            for (size_t i = 0; i < std::size(kGestures); ++i) {
+                text += kGestures[(first + i) % std::size(kGestures)];
+                text += "idle 20ms\n";
+            }
+            rotations.push_back(Platform::GestureScriptParser::parse(text));
+        }
+        return rotations;
+    }();
+    static size_t services = 0;
+    return scripts[services++ % scripts.size()];
 }
 
 std::atomic<uint64_t> deliveredEvents{0};
@@ -68,10 +88,8 @@ void countEvent(void*, void*, void*, HIDEvent*, uint32_t) { deliveredEvents.fetc
 class LiveService {
 public:
     LiveService()
-        : _device([] {
-              static const Platform::GestureScript script = sessionScript();
-              return std::make_shared<Platform::SimulatedSensor>(script, Platform::SensorReportGenerator::Options{5, 0, 0x5EED});
-          }()),
+        : _device(std::make_shared<Platform::SimulatedSensor>(
+              nextScript(), Platform::SensorReportGenerator::Options{kFramePeriodMs, 0, 0x5EED})),
           _registration([device = _device] { return device; }),
           _service(ZeltoTouchHIDService::create()),
           _queue(Platform::DispatchQueue::create("fuzz host queue")) {
