@@ -5,6 +5,7 @@
 // always reads back as a container.
 
 #include <atomic>
+#include <chrono>
 #include <cmath>
 #include <cstdint>
 #include <cstdio>
@@ -84,6 +85,13 @@ std::atomic<uint64_t> deliveredEvents{0};
 
 void countEvent(void*, void*, void*, HIDEvent*, uint32_t) { deliveredEvents.fetch_add(1, std::memory_order_relaxed); }
 
+// A fresh service every so many inputs or once it is this old, whichever comes first: bounds
+// what the device's property store and the recording accumulate (slow inputs would otherwise
+// let report frames pile up and slow every read further), and runs the lifecycle again and
+// again under load.
+constexpr uint64_t kInputsPerService = 10;
+constexpr auto kServiceLifetime = std::chrono::milliseconds(100);
+
 // A service started, opened and scheduled on a fresh simulated sensor; torn down in the host's order.
 class LiveService {
 public:
@@ -109,17 +117,19 @@ public:
     LiveService& operator=(const LiveService&) = delete;
 
     ZeltoTouchHIDService& service() { return *_service; }
+    // Counts this input; true once the service has served its share.
+    bool spentAfterThisInput() {
+        return ++_inputs >= kInputsPerService || std::chrono::steady_clock::now() - _started >= kServiceLifetime;
+    }
 
 private:
     std::shared_ptr<Platform::SimulatedSensor> _device;
     Platform::ScopedDeviceService _registration;
     ZeltoTouchHIDService* _service;
     std::shared_ptr<Platform::DispatchQueue> _queue;
+    const std::chrono::steady_clock::time_point _started = std::chrono::steady_clock::now();
+    uint64_t _inputs = 0;
 };
-
-// A fresh service every so many inputs: bounds what the device's property store and the
-// recording accumulate, and runs the lifecycle again and again under load.
-constexpr uint64_t kInputsPerService = 10;
 
 std::unique_ptr<LiveService>& liveService() {
     static std::unique_ptr<LiveService> live;
@@ -193,12 +203,8 @@ extern "C" int LLVMFuzzerInitialize(int*, char***) {
 }
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    static uint64_t inputs = 0;
     std::unique_ptr<LiveService>& live = liveService();
-    if (!live || ++inputs % kInputsPerService == 0) {
-        live.reset();
-        live = std::make_unique<LiveService>();
-    }
+    if (!live) live = std::make_unique<LiveService>();
 
     FuzzedDataProvider input(data, size);
     Fuzz::FuzzedValues values(input);
@@ -212,5 +218,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
             (void)live->service().getPropertyForKey(key).description();
         }
     }
+    if (live->spentAfterThisInput()) live.reset();
     return 0;
 }
